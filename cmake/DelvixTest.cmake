@@ -1,0 +1,14 @@
+# delvix_add_test(<name> SOURCES <files...> [LIBS <targets...>] [ENV <VAR=value...>])
+# One Qt Test executable per test file, registered with CTest. Widgets run offscreen
+# and settings go to a private folder per test, so tests never touch the user's files.
+function(delvix_add_test name)
+    cmake_parse_arguments(ARG "" "" "SOURCES;LIBS;ENV" ${ARGN})
+    add_executable(${name} ${ARG_SOURCES})
+    target_link_libraries(${name} PRIVATE Qt6::Test ${ARG_LIBS})
+    add_test(NAME ${name} COMMAND ${name})
+    set_tests_properties(${name} PROPERTIES
+        TIMEOUT 300
+        ENVIRONMENT "QT_QPA_PLATFORM=offscreen;XDG_CONFIG_HOME=${CMAKE_BINARY_DIR}/test-config/${name};XDG_RUNTIME_DIR=${CMAKE_BINARY_DIR}/test-runtime/${name};${ARG_ENV}")
+    file(MAKE_DIRECTORY ${CMAKE_BINARY_DIR}/test-runtime/${name})
+    file(CHMOD ${CMAKE_BINARY_DIR}/test-runtime/${name} DIRECTORY_PERMISSIONS OWNER_READ OWNER_WRITE OWNER_EXECUTE)
+endfunction()
