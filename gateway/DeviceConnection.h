@@ -1,0 +1,59 @@
+#pragma once
+
+#include "FrameDecoder.h"
+#include "Protocol.h"
+
+#include <QDeadlineTimer>
+#include <QString>
+
+#include <memory>
+
+class QLocalSocket;
+
+// One blocking connection from the calling thread to a device's socket. Needs no event
+// loop: every wait is a blocking wait bounded by the call's deadline. Not shared between
+// threads. After any failure the connection is dropped; the next call opens a new one.
+class DeviceConnection
+{
+public:
+    explicit DeviceConnection(const QString& socketPath);
+    ~DeviceConnection();
+    DeviceConnection(const DeviceConnection&) = delete;
+    DeviceConnection& operator=(const DeviceConnection&) = delete;
+
+    QString socketPath() const { return m_socketPath; }
+
+    // Sends one request and waits for its answer. Returns the answer's result (or a client
+    // error code) and stores the answer's fields after the result in body.
+    qint32 call(Operation operation, const QByteArray& request, Protocol::RequestFlags flags, QByteArray* body,
+                QDeadlineTimer deadline);
+
+    // Discovery in two steps, so that many devices can be asked at once: start connects
+    // and sends the handshake without waiting for it; finish waits for the answer.
+    bool startHandshake();
+    qint32 finishHandshake(QDeadlineTimer deadline);
+
+    QString displayName() const { return m_displayName; }
+    QString deviceId() const { return m_deviceId; }
+    // What went wrong in the last failed call.
+    QString errorString() const { return m_error; }
+
+private:
+    qint32 open(QDeadlineTimer deadline);
+    bool usable();
+    qint32 exchange(Operation operation, const QByteArray& request, Protocol::RequestFlags flags, QByteArray* body,
+                    QDeadlineTimer deadline);
+    qint32 send(Operation operation, const QByteArray& request, Protocol::RequestFlags flags, QDeadlineTimer deadline);
+    qint32 receive(Operation operation, QByteArray* body, QDeadlineTimer deadline);
+    qint32 fail(qint32 code, const QString& message);
+
+    QString m_socketPath;
+    std::unique_ptr<QLocalSocket> m_socket;
+    FrameDecoder m_decoder;
+    quint32 m_nextRequestId = 1;
+    quint32 m_pendingRequestId = 0;
+    bool m_greeted = false;
+    QString m_displayName;
+    QString m_deviceId;
+    QString m_error;
+};

@@ -1,0 +1,32 @@
+#pragma once
+
+#include "Frame.h"
+
+#include <QByteArray>
+#include <QString>
+
+// Cuts a byte stream into frames. Used by both ends of a connection; everything it reads
+// comes from the peer and is checked before use.
+class FrameDecoder
+{
+public:
+    enum class Status
+    {
+        NeedMore,   // no complete frame buffered yet
+        Ready,      // a frame was taken out
+        Malformed,  // the stream cannot be framed; the connection must close
+    };
+
+    void feed(const QByteArray& bytes);
+    Status next(Frame* frame);
+
+    // True while bytes of an unfinished frame are buffered.
+    bool hasPartialFrame() const { return m_buffer.size() > m_offset; }
+    QString errorString() const { return m_error; }
+    void clear();
+
+private:
+    QByteArray m_buffer;
+    qsizetype m_offset = 0;  // start of the first unread byte
+    QString m_error;
+};

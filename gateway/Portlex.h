@@ -1,0 +1,39 @@
+#pragma once
+
+#include "ProgressCallback.h"
+#include "_ZantDevice.h"
+
+#include "MifEntry.h"
+
+#include <QList>
+#include <QPair>
+#include <QSharedPointer>
+#include <QString>
+
+#include <vector>
+
+// The gateway: finds the devices (simulators listening in Protocol::socketDirectory()),
+// hands out their objects and connects them. Thread-safe.
+class Portlex
+{
+public:
+    static bool Initialize();
+    // Forgets every device; objects still held elsewhere stay usable.
+    static void Destroy();
+    // Holders of device pointers announce themselves, so Destroy can tell who is left.
+    static void Ref();
+    static void Deref();
+
+    // Lists the reachable devices as (display name, device id); returns their number.
+    static unsigned GetDevices(QList<QPair<QString, QString>>& devices);
+    // The device with that id as last listed by GetDevices; null if never listed.
+    static QSharedPointer<_ZantDevice> GetDevice(const QString& id);
+    // Attaches to the device and fills its cache; on false see LastError and LastStatus.
+    static bool ConnectDevice(const QSharedPointer<_ZantDevice>& device, const QString& user, const QString& password);
+    static unsigned LastError();
+    static QString LastStatus();
+
+    // Collects the module entries of every MIF file below directory.
+    static int GetPlatformClassIds(const QString& directory, std::vector<MifEntry>& entries,
+                                   PortlexProgressCallback callback, void* context);
+};

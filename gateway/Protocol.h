@@ -1,0 +1,154 @@
+#pragma once
+
+// The wire protocol between the gateway client (portlex) and a device (zantro-sim).
+//
+// Transport: a Unix local socket, one request at a time per connection; a client may
+// hold several connections to one device (one per calling thread).
+//
+// Frame: a fixed 20-byte header, big-endian, then the payload.
+//     quint32 magic       FrameMagic
+//     quint32 size        payload bytes that follow the header, at most MaxPayloadSize
+//     quint16 version     ProtocolVersion of the sender
+//     quint16 flags       RequestFlags on requests, 0 on answers
+//     quint32 requestId   chosen by the client, echoed by the answer
+//     quint32 operation   an Operation; the answer repeats it
+// The payload is a QDataStream (version StreamVersion, little-endian: the byte order of
+// every host we run on, so texts need no swapping). Lists are a quint32 count followed by
+// the elements (QDataStream's container form); records use the operators of
+// RecordStreams.h. A frame with a wrong magic or an oversized size closes
+// the connection; nothing else is affected.
+//
+// Every answer payload starts with `qint32 result` (0 = success, else a code from
+// PortlexErrors.h or one the device chooses); the fields listed under "answer" follow the
+// result and are present when the result is 0 unless stated otherwise.
+//
+// Handshake: the first frame on every connection is Hello. A device that does not speak
+// the client's version answers VersionMismatch with a message and closes the connection.
+// Any other frame before a successful Hello, or a later frame with another version,
+// closes the connection.
+
+#include <QDataStream>
+#include <QFlags>
+#include <QString>
+
+enum class Operation : quint32
+{
+    // --- discovery and identity ---------------------------------------------------------
+    // request: quint16 version, QString clientName
+    // answer:  QString displayName, QString deviceId
+    //          on VersionMismatch: QString message (then the device closes the connection)
+    Hello = 1,
+    // request: QString user, QString password (both empty from ConnectDevice)
+    // answer:  QString statusText, present whatever the result (a refusal says why)
+    Connect = 2,
+    // request: empty          answer: DeviceCache
+    GetCache = 3,
+
+    // --- queries -------------------------------------------------------------------------
+    // request: empty          answer: list of ModuleInfo
+    GetModules = 10,
+    // request: QString modulePath (ModuleInfo::path)      answer: MifEntry
+    GetModuleMif = 11,
+    // request: empty          answer: list of LoadedModuleInfo, processes and modules by ascending id
+    GetLoadedModules = 12,
+    // request: empty          answer: list of ProcessInfo, processes and threads by ascending id
+    GetProcesses = 13,
+    // request: empty          answer: list of VolumeInfo
+    GetVolumes = 14,
+    // request: empty          answer: list of RegistryInfo
+    GetRegistry = 15,
+    // request: QString path ("/" is the root)
+    // answer:  _SettingsInfo: the node's name, path and values, and its direct children
+    //          (name and path only)
+    GetChildSettings = 16,
+    // request: QString path (a volume's mount point is its root)
+    // answer:  _DirectoryInfo: the directory's name and path, its files and its direct
+    //          sub-directories (without contents)
+    GetFileSystemLevel = 17,
+    // request: empty          answer: list of PriviledgeRecord of the enablement service
+    GetTepSigPrivs = 18,
+    // request: empty
+    // answer:  qint32 status (EnablementStatus), QString mode, QString owner, QString expiry
+    //          (expiry in the ctime layout, e.g. "Sun Sep 19 20:00:00 2027")
+    TepStatus = 19,
+    // request and answer as TepStatus, for the global test signature
+    GlobalTestSigStatus = 20,
+
+    // --- actions -------------------------------------------------------------------------
+    // Transfers are bound to their connection: a connection that closes aborts its open
+    // transfers, and the device removes their temporary files.
+    //
+    // Copy from the device: the device opens the file and streams it.
+    // request: QString devicePath             answer: quint32 transferId, quint64 size
+    CopyToPCBegin = 30,
+    // request: quint32 transferId, quint32 maxBytes (at most TransferChunkSize)
+    // answer:  QByteArray bytes, empty at the end of the file
+    CopyToPCChunk = 31,
+    // request: quint32 transferId             answer: nothing more
+    CopyToPCEnd = 32,
+    // Copy to the device: the device writes a temporary file beside the target and renames
+    // it on commit, so a cut transfer leaves nothing. A size above the free space is refused.
+    // request: QString devicePath, quint64 size     answer: quint32 transferId
+    CopyToDeviceBegin = 33,
+    // request: quint32 transferId, QByteArray bytes (at most TransferChunkSize)
+    // answer:  nothing more
+    UploadChunk = 34,
+    // request: quint32 transferId             answer: nothing more (the file is in place)
+    CopyToDeviceCommit = 35,
+    // request: quint32 transferId             answer: nothing more (the temporary file is gone)
+    UploadAbort = 36,
+    // Package installation: the package is uploaded with UploadChunk, then extracted into
+    // the volume's module folder on commit.
+    // request: quint16 volumeId, QString packageName, quint64 size
+    // answer:  quint32 transferId, then QString statusText whatever the result
+    InstallPackageBegin = 37,
+    // request: quint32 transferId             answer: QString statusText whatever the result
+    InstallPackageCommit = 38,
+    // request: QString devicePath of a .mod   answer: nothing more
+    RunApplication = 39,
+    // request: QString devicePath (a file, or a directory with its contents)
+    // answer:  nothing more
+    DeleteDeviceFile = 40,
+};
+
+namespace Protocol {
+
+constexpr quint32 FrameMagic = 0x5A4E5452;  // "ZNTR"
+constexpr quint16 ProtocolVersion = 1;
+constexpr QDataStream::Version StreamVersion = QDataStream::Qt_6_4;
+constexpr int HeaderSize = 20;
+constexpr quint32 MaxPayloadSize = 16 * 1024 * 1024;
+constexpr quint32 TransferChunkSize = 1024 * 1024;
+
+// Every gateway call completes or fails within this time.
+constexpr int CallTimeoutMs = 5000;
+// Discovery asks every socket for its identity within this time, all at once.
+constexpr int DiscoveryTimeoutMs = 500;
+// A device drops a connection that stays without a handshake, or with a frame only
+// partly received, for this long.
+constexpr int HalfOpenTimeoutMs = 5000;
+
+// Lock requests carried with a request (the header's flags): the device disables the
+// named mode before it answers.
+enum RequestFlag : quint16
+{
+    NoFlags = 0,
+    ServiceLockRequest = 0x1,
+    SignatureLockRequest = 0x2,
+};
+using RequestFlags = QFlags<RequestFlag>;
+
+bool isKnownOperation(quint32 value);
+// The operation's name as written in this header ("GetRegistry"); empty when unknown.
+QString operationName(Operation operation);
+
+// The folder that holds the devices' sockets: ZANTRO_SIM_DIR, else the per-user runtime
+// location + "/zantro-sim".
+QString socketDirectory();
+// Creates the folder with mode 0700 (or tightens an existing one of ours to 0700).
+// Refuses a folder that is a link or belongs to another user.
+bool ensureSocketDirectory(const QString& directory, QString* error);
+
+} // namespace Protocol
+
+Q_DECLARE_OPERATORS_FOR_FLAGS(Protocol::RequestFlags)

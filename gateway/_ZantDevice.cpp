@@ -1,0 +1,264 @@
+#include "_ZantDevice.h"
+
+#include "DeviceConnection.h"
+#include "PayloadStream.h"
+#include "PortlexErrors.h"
+#include "RecordStreams.h"
+#include "ThreadConnections.h"
+
+#include <QMutexLocker>
+
+namespace {
+
+template <typename... Values>
+QByteArray pack(const Values&... values)
+{
+    QByteArray bytes;
+    PayloadStream out(&bytes);
+    ((out << values), ...);
+    return bytes;
+}
+
+template <typename T>
+void readField(QDataStream& in, QVector<T>& list)
+{
+    readList(in, list);
+}
+
+template <typename T>
+void readField(QDataStream& in, T& value)
+{
+    in >> value;
+}
+
+// Failures after which the device may not have seen the request.
+bool transportFailure(int result)
+{
+    return result == PortlexError::Timeout || result == PortlexError::Unreachable || result == PortlexError::ProtocolError
+        || result == PortlexError::VersionMismatch;
+}
+
+} // namespace
+
+_ZantDevice::_ZantDevice(const QString& displayName, const QString& socketPath)
+    : name(displayName), m_socketPath(socketPath), m_lifetime(std::make_shared<int>(0))
+{
+}
+
+_ZantDevice::~_ZantDevice() = default;
+
+QString _ZantDevice::socketPath() const
+{
+    QMutexLocker lock(&m_mutex);
+    return m_socketPath;
+}
+
+void _ZantDevice::setSocketPath(const QString& socketPath)
+{
+    QMutexLocker lock(&m_mutex);
+    m_socketPath = socketPath;
+}
+
+int _ZantDevice::call(Operation operation, const QByteArray& request, QByteArray* body, QString* error)
+{
+    const bool attaching = operation == Operation::Connect || operation == Operation::GetCache;
+    if (!attaching && !m_connected) {
+        if (error)
+            *error = QStringLiteral("The device is not connected");
+        return PortlexError::NotConnected;
+    }
+    const bool service = serviceLockRequest.exchange(false);
+    const bool signature = signatureLockRequest.exchange(false);
+    Protocol::RequestFlags flags;
+    flags.setFlag(Protocol::ServiceLockRequest, service);
+    flags.setFlag(Protocol::SignatureLockRequest, signature);
+
+    DeviceConnection& connection = ThreadConnections::forDevice(m_lifetime, socketPath());
+    const int result = connection.call(operation, request, flags, body, QDeadlineTimer(Protocol::CallTimeoutMs));
+    if (transportFailure(result)) {
+        // Keep the requests for the next call, which reaches the device again.
+        if (service)
+            serviceLockRequest = true;
+        if (signature)
+            signatureLockRequest = true;
+        if (error)
+            *error = connection.errorString();
+    }
+    return result;
+}
+
+template <typename... Fields>
+int _ZantDevice::query(Operation operation, const QByteArray& request, Fields&... fields)
+{
+    QByteArray body;
+    const int result = call(operation, request, &body);
+    if (result != 0)
+        return result;
+    PayloadStream in(body);
+    (readField(in, fields), ...);
+    return in.ok() ? 0 : int(PortlexError::ProtocolError);
+}
+
+bool _ZantDevice::attach(const QString& user, const QString& password, int* code, QString* reason)
+{
+    QByteArray body;
+    QString error;
+    *code = call(Operation::Connect, pack(user, password), &body, &error);
+    if (transportFailure(*code)) {
+        *reason = error;
+        return false;
+    }
+    PayloadStream in(body);
+    QString status;
+    in >> status;
+    statusText = status;
+    if (*code != 0) {
+        *reason = status;
+        return false;
+    }
+    DeviceCache filled;
+    *code = query(Operation::GetCache, QByteArray(), filled);
+    if (*code != 0) {
+        *reason = QStringLiteral("The device did not give its description (%1)").arg(*code);
+        return false;
+    }
+    cache = filled;
+    m_connected = true;
+    return true;
+}
+
+int _ZantDevice::GetModules(QVector<ModuleInfo>& modules, PortlexProgressCallback, void*)
+{
+    // The answer arrives as one frame: there are no steps to report.
+    QVector<ModuleInfo> answer;
+    const int result = query(Operation::GetModules, QByteArray(), answer);
+    if (result == 0)
+        modules = std::move(answer);
+    return result;
+}
+
+int _ZantDevice::GetModuleMif(const QString& modulePath, MifEntry& entry)
+{
+    MifEntry answer;
+    const int result = query(Operation::GetModuleMif, pack(modulePath), answer);
+    if (result == 0)
+        entry = std::move(answer);
+    return result;
+}
+
+int _ZantDevice::GetLoadedModules(QVector<LoadedModuleInfo>& processes)
+{
+    QVector<LoadedModuleInfo> answer;
+    const int result = query(Operation::GetLoadedModules, QByteArray(), answer);
+    if (result == 0)
+        processes = std::move(answer);
+    return result;
+}
+
+int _ZantDevice::GetProcesses(QVector<ProcessInfo>& processes)
+{
+    QVector<ProcessInfo> answer;
+    const int result = query(Operation::GetProcesses, QByteArray(), answer);
+    if (result == 0)
+        processes = std::move(answer);
+    return result;
+}
+
+int _ZantDevice::GetVolumes(QSet<VolumeInfo>& volumes)
+{
+    QVector<VolumeInfo> answer;
+    const int result = query(Operation::GetVolumes, QByteArray(), answer);
+    if (result == 0)
+        volumes = QSet<VolumeInfo>(answer.cbegin(), answer.cend());
+    return result;
+}
+
+int _ZantDevice::GetRegistry(QVector<RegistryInfo>& entries, PortlexProgressCallback, void*)
+{
+    QVector<RegistryInfo> answer;
+    const int result = query(Operation::GetRegistry, QByteArray(), answer);
+    if (result == 0)
+        entries = std::move(answer);
+    return result;
+}
+
+int _ZantDevice::GetChildSettings(QSharedPointer<_SettingsInfo>& node)
+{
+    if (!node)
+        return PortlexError::InvalidArgument;
+    _SettingsInfo answer;
+    const int result = query(Operation::GetChildSettings, pack(node->Path()), answer);
+    if (result == 0)
+        *node = std::move(answer);
+    return result;
+}
+
+int _ZantDevice::GetFileSystemLevel(const QString& path, QSharedPointer<_DirectoryInfo>& level, PortlexProgressCallback,
+                                    void*)
+{
+    _DirectoryInfo answer;
+    const int result = query(Operation::GetFileSystemLevel, pack(path), answer);
+    if (result == 0) {
+        if (!level)
+            level = QSharedPointer<_DirectoryInfo>::create();
+        *level = std::move(answer);
+    }
+    return result;
+}
+
+int _ZantDevice::GetTepSigPrivs(QVector<PriviledgeRecord>& privileges)
+{
+    QVector<PriviledgeRecord> answer;
+    const int result = query(Operation::GetTepSigPrivs, QByteArray(), answer);
+    if (result == 0)
+        privileges = std::move(answer);
+    return result;
+}
+
+EnablementStatus _ZantDevice::TepStatus(QString& mode, QString& owner, QString& expiry)
+{
+    return enablement(Operation::TepStatus, mode, owner, expiry);
+}
+
+EnablementStatus _ZantDevice::GlobalTestSigStatus(QString& mode, QString& owner, QString& expiry)
+{
+    return enablement(Operation::GlobalTestSigStatus, mode, owner, expiry);
+}
+
+EnablementStatus _ZantDevice::enablement(Operation operation, QString& mode, QString& owner, QString& expiry)
+{
+    qint32 status = EnablementDisabled;
+    QString answerMode, answerOwner, answerExpiry;
+    const int result = query(operation, QByteArray(), status, answerMode, answerOwner, answerExpiry);
+    if (result != 0)
+        return EnablementStatus(result);
+    mode = answerMode;
+    owner = answerOwner;
+    expiry = answerExpiry;
+    return EnablementStatus(status);
+}
+
+int _ZantDevice::CopyFileToPC(const QString&, const QString&)
+{
+    return PortlexError::NotImplemented;
+}
+
+int _ZantDevice::CopyFileToDevice(const QString&, const QString&)
+{
+    return PortlexError::NotImplemented;
+}
+
+int _ZantDevice::InstallPackage(const QString&, unsigned short)
+{
+    return PortlexError::NotImplemented;
+}
+
+int _ZantDevice::RunApplication(const QString&)
+{
+    return PortlexError::NotImplemented;
+}
+
+int _ZantDevice::DeleteDeviceFile(const QString&)
+{
+    return PortlexError::NotImplemented;
+}

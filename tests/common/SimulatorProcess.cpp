@@ -1,0 +1,116 @@
+#include "SimulatorProcess.h"
+
+#include "DeviceConnection.h"
+
+#include <QCoreApplication>
+#include <QDeadlineTimer>
+#include <QDir>
+
+#include <signal.h>
+
+namespace {
+
+constexpr int StartTimeoutMs = 20000;
+constexpr int ProbeTimeoutMs = 200;
+
+} // namespace
+
+SimulatorProcess::SimulatorProcess(const QString& socketDirectory)
+    : m_socketDirectory(socketDirectory)
+{
+    m_process.setProcessChannelMode(QProcess::MergedChannels);
+}
+
+SimulatorProcess::~SimulatorProcess()
+{
+    if (isRunning()) {
+        resume();
+        stop();
+    }
+}
+
+QString SimulatorProcess::executable()
+{
+    return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim");
+}
+
+QString SimulatorProcess::sampleImage(const QString& name)
+{
+    return QStringLiteral(DELVIX_SAMPLES_DIR "/devices/") + name;
+}
+
+bool SimulatorProcess::start(const QString& image, const QString& id, const QStringList& extraArguments, Image use)
+{
+    m_error.clear();
+    m_socketPath.clear();
+    QStringList arguments { QStringLiteral("--image"), image, QStringLiteral("--id"), id, QStringLiteral("--socket-dir"),
+                            m_socketDirectory };
+    if (use == Image::FreshCopy)
+        arguments << QStringLiteral("--reset");
+    arguments += extraArguments;
+    m_process.start(executable(), arguments);
+    if (!m_process.waitForStarted()) {
+        m_error = m_process.errorString();
+        return false;
+    }
+    const QDeadlineTimer deadline(StartTimeoutMs);
+    while (!deadline.hasExpired()) {
+        m_socketPath = findSocket(id);
+        if (!m_socketPath.isEmpty())
+            return true;
+        // Doubles as the pause between probes and notices an early exit.
+        if (m_process.waitForFinished(20) || m_process.state() == QProcess::NotRunning) {
+            m_error = QStringLiteral("zantro-sim ended: ") + QString::fromLocal8Bit(m_process.readAll());
+            return false;
+        }
+    }
+    m_error = QStringLiteral("zantro-sim did not answer in time: ") + QString::fromLocal8Bit(m_process.readAll());
+    stop();
+    return false;
+}
+
+QString SimulatorProcess::findSocket(const QString& id) const
+{
+    const QDir folder(m_socketDirectory);
+    const QStringList names = folder.entryList(QDir::System | QDir::Files | QDir::Hidden | QDir::NoDotAndDotDot);
+    for (const QString& name : names) {
+        DeviceConnection probe(folder.filePath(name));
+        if (probe.startHandshake() && probe.finishHandshake(QDeadlineTimer(ProbeTimeoutMs)) == 0 && probe.deviceId() == id)
+            return probe.socketPath();
+    }
+    return QString();
+}
+
+bool SimulatorProcess::stop()
+{
+    if (!isRunning())
+        return true;
+    sendSignal(SIGTERM);
+    if (m_process.waitForFinished(10000))
+        return m_process.exitStatus() == QProcess::NormalExit;
+    m_process.kill();
+    m_process.waitForFinished();
+    return false;
+}
+
+void SimulatorProcess::kill()
+{
+    sendSignal(SIGKILL);
+    m_process.waitForFinished();
+}
+
+void SimulatorProcess::pause()
+{
+    sendSignal(SIGSTOP);
+}
+
+void SimulatorProcess::resume()
+{
+    sendSignal(SIGCONT);
+}
+
+void SimulatorProcess::sendSignal(int number)
+{
+    if (isRunning())
+        ::kill(pid_t(m_process.processId()), number);
+}
