@@ -1,0 +1,41 @@
+#pragma once
+
+#include "FailurePlan.h"
+#include "RequestHandler.h"
+
+#include <QString>
+
+class DeviceState;
+
+// Answers the gateway's requests from a DeviceState: applies the lock requests a request
+// carries, the --fail rules and a refused connection, then builds the answer that
+// Protocol.h lists for the operation.
+class SimRequestHandler : public RequestHandler
+{
+public:
+    explicit SimRequestHandler(DeviceState& state);
+
+    // A refused Connect answers code with text as its status.
+    void refuseConnect(qint32 code, const QString& text);
+    void setFailurePlan(const FailurePlan& plan) { m_failures = plan; }
+
+    QString displayName() const override;
+    QString deviceId() const override;
+    Answer handle(const Request& request) override;
+
+    // The operations a request can carry, and their names (what --fail may name).
+    static QList<Operation> operations();
+    static QStringList operationNames();
+    // The path a request names, or empty for operations that take none; false when the
+    // payload does not hold one.
+    static bool requestPath(const Request& request, QString& path);
+
+private:
+    Answer serve(const Request& request, const QString& path);
+    Answer enablement(bool service);
+
+    DeviceState& m_state;
+    FailurePlan m_failures;
+    qint32 m_refuseCode = 0;
+    QString m_refuseText;
+};

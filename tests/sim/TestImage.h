@@ -1,0 +1,34 @@
+#pragma once
+
+#include "SampleBuilder.h"
+
+#include <QByteArray>
+#include <QString>
+#include <QTemporaryDir>
+
+// A small device image in a temporary folder, for tests that need exact, known contents:
+// a flash volume "/" (module folders sys/mod and usermod) and a card volume "/card".
+class TestImage
+{
+public:
+    TestImage();
+
+    QString path() const { return m_dir.path(); }
+    // The folder beside the image; tests put their canaries here.
+    QString outside() const { return m_outside.path(); }
+
+    static QByteArray defaultProfile();
+    void writeProfile(const QByteArray& deviceXml);
+    void writeFile(const QString& relativePath, const QByteArray& bytes);
+    void addModule(const QString& relativeFolder, const SampleBuilder::ModuleSpec& module);
+
+    // The default contents: profile, a system and a user module, a few files.
+    void fillDefault();
+
+    static SampleBuilder::ModuleSpec module(const QString& name, const QVector<quint32>& classes,
+                                            const QVector<MifMimeType>& mimeTypes = {});
+
+private:
+    QTemporaryDir m_dir;
+    QTemporaryDir m_outside;
+};
