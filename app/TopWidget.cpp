@@ -1,0 +1,10 @@
+#include "TopWidget.h"
+
+#include <QWidget>
+
+QWidget* TopWidget(QWidget* widget)
+{
+    while (widget && widget->parentWidget())
+        widget = widget->parentWidget();
+    return widget;
+}
