@@ -1,0 +1,168 @@
+#include "Delvix.h"
+
+#include "AboutDialog.h"
+#include "DeviceWindow.h"
+#include "Portlex.h"
+#include "SplashDialog.h"
+
+#include <QApplication>
+#include <QMenu>
+#include <QSettings>
+#include <QSystemTrayIcon>
+
+#include <algorithm>
+
+namespace {
+
+const char* const Version = "0.5.1.0";
+
+// What each menu action carries as data; the menu logic keys on it.
+enum MenuRole : uint
+{
+    PlainEntry = 0,
+    AboutEntry = 1,
+    DeviceSectionStart = 2,
+    DeviceSectionEnd = 3,
+    DeviceEntry = 999
+};
+
+QString notice()
+{
+    return QStringLiteral("\u00a9 Norvale. All rights reserved.");
+}
+
+} // namespace
+
+Delvix::Delvix(QWidget* parent)
+    : QDialog(parent)
+{
+    auto* splash = new SplashDialog(":/Resources/splash.png", notice(), Version);
+    splash->show();
+    splash->startCloseTimer(3500);
+
+    setWindowFlags(windowFlags() & ~Qt::WindowContextHelpButtonHint);
+    setupUi(this);
+    _actionNoDevices->setEnabled(false);
+    createTrayIcon();
+    m_trayIcon->show();
+    hide();
+
+    _actionAbout->setData(AboutEntry);
+    connect(_actionAbout, &QAction::triggered, this, &Delvix::onTriggered);
+
+    QSettings settings;
+    const int seen = settings.value("seen", 0).toInt();
+    if (seen < 2) {
+        m_trayIcon->showMessage("Delvix",
+                                tr("Zantro Delvix is ready.  Right click to interrogate any gateway enabled "
+                                   "device or simulator."),
+                                QSystemTrayIcon::Information, 10000);
+        settings.setValue("seen", seen + 1);
+    }
+}
+
+void Delvix::createTrayIcon()
+{
+    m_trayMenu = new QMenu(this);
+    connect(m_trayMenu, &QMenu::aboutToShow, this, &Delvix::onAboutToShow);
+    m_trayMenu->addAction(_actionAbout);
+    m_trayMenu->addAction(_actionProcess_Platform);
+    m_trayMenu->addAction(_actionCompare_Platforms);
+    m_trayMenu->addSeparator()->setData(DeviceSectionStart);
+    m_trayMenu->addAction(_actionNoDevices);
+    m_trayMenu->addSeparator()->setData(DeviceSectionEnd);
+    m_trayMenu->addAction(_actionExit);
+    connect(_actionExit, &QAction::triggered, this, &Delvix::onActionExit);
+
+    m_trayIcon = new QSystemTrayIcon(this);
+    m_trayIcon->setContextMenu(m_trayMenu);
+    m_trayIcon->setIcon(QIcon(":/Resources/TrayIcon.png"));
+}
+
+void Delvix::onAboutToShow()
+{
+    bool inSection = false;
+    QAction* sectionEnd = nullptr;
+    for (QAction* action : m_trayMenu->actions()) {
+        const uint role = action->data().toUInt();
+        if (role == DeviceSectionStart) {
+            inSection = true;
+        } else if (role == DeviceSectionEnd) {
+            sectionEnd = action;
+            inSection = false;
+        } else if (inSection) {
+            m_trayMenu->removeAction(action);
+            if (role == DeviceEntry)
+                delete action;
+        }
+    }
+
+    QList<QPair<QString, QString>> devices;
+    if (Portlex::GetDevices(devices) == 0) {
+        m_trayMenu->insertAction(sectionEnd, _actionNoDevices);
+        return;
+    }
+    // Each entry goes above the one before it, so the menu lists the devices in reverse.
+    QAction* before = sectionEnd;
+    for (const auto& device : devices) {
+        auto* entry = new QAction(device.first, this);
+        connect(entry, &QAction::triggered, this, &Delvix::onTriggered);
+        entry->setData(DeviceEntry);
+        entry->setProperty("TargetID", device.second);
+        m_trayMenu->insertAction(before, entry);
+        before = entry;
+    }
+}
+
+void Delvix::onTriggered(bool)
+{
+    auto* action = qobject_cast<QAction*>(sender());
+    if (!action)
+        return;
+    switch (action->data().toUInt()) {
+    case PlainEntry:
+    case DeviceSectionStart:
+        break;
+    case AboutEntry:
+        showAbout();
+        break;
+    default:
+        connectToDevice(action->property("TargetID").toString());
+    }
+}
+
+void Delvix::showAbout()
+{
+    AboutDialog about(":/Resources/about.png", notice(), Version);
+    about.setComponents({"Portlex.dll\t0.9.0.3", "Skinwell.dll\t1.0.0.1"});
+    about.setModal(true);
+    about.exec();
+}
+
+void Delvix::connectToDevice(const QString& targetId)
+{
+    const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(targetId);
+    if (!device)
+        return;
+    if (!device->Connected() && !Portlex::ConnectDevice(device, QString(), QString())) {
+        m_trayIcon->showMessage(tr("Connect Failed"),
+                                "Failure Code: (" + QString::number(Portlex::LastError()) + ") "
+                                    + Portlex::LastStatus(),
+                                QSystemTrayIcon::Information, 2500);
+        return;
+    }
+    auto* window = new DeviceWindow;
+    window->setDevice(targetId);
+    window->show();
+}
+
+void Delvix::onActionExit()
+{
+    QApplication::setQuitOnLastWindowClosed(true);
+    for (QWidget* window : QApplication::topLevelWidgets())
+        window->close();
+    // Qt ends the loop when the last visible window closes; with none open, nothing would.
+    const QWidgetList left = QApplication::topLevelWidgets();
+    if (std::none_of(left.begin(), left.end(), [](const QWidget* window) { return window->isVisible(); }))
+        QCoreApplication::quit();
+}

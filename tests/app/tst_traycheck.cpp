@@ -1,0 +1,27 @@
+#include "DesktopDriver.h"
+
+#include <QProcess>
+#include <QTest>
+
+// The program on a display without a system tray: it says so and ends with code 1.
+class TrayCheckTest : public QObject
+{
+    Q_OBJECT
+
+private slots:
+    void withoutTrayEndsWithCodeOne();
+};
+
+void TrayCheckTest::withoutTrayEndsWithCodeOne()
+{
+    QProcess delvix;
+    delvix.start(QCoreApplication::applicationDirPath() + "/delvix");
+    QVERIFY(delvix.waitForStarted());
+    QVERIFY(DesktopDriver::pressKeysIn("^Systray$", {"Return"}));
+    QVERIFY(delvix.waitForFinished(15000));
+    QCOMPARE(delvix.exitStatus(), QProcess::NormalExit);
+    QCOMPARE(delvix.exitCode(), 1);
+}
+
+QTEST_GUILESS_MAIN(TrayCheckTest)
+#include "tst_traycheck.moc"
