@@ -27,10 +27,30 @@ qint32 DeviceConnection::call(Operation operation, const QByteArray& request, Pr
     return exchange(operation, request, flags, body, deadline);
 }
 
+qint32 DeviceConnection::post(Operation operation, const QByteArray& request, QDeadlineTimer deadline)
+{
+    if (m_pending.empty() && !usable()) {
+        const qint32 opened = open(deadline);
+        if (opened != 0)
+            return opened;
+    }
+    if (!m_socket)
+        return PortlexError::Unreachable;
+    return send(operation, request, Protocol::NoFlags, deadline);
+}
+
+qint32 DeviceConnection::collect(Operation operation, QByteArray* body, QDeadlineTimer deadline)
+{
+    if (!m_socket || m_pending.empty())
+        return fail(PortlexError::ProtocolError, QStringLiteral("No answer is pending"));
+    return receive(operation, body, deadline);
+}
+
 bool DeviceConnection::startHandshake()
 {
     m_greeted = false;
     m_decoder.clear();
+    m_pending.clear();
     m_socket = std::make_unique<QLocalSocket>();
     m_socket->connectToServer(m_socketPath);
     if (m_socket->state() == QLocalSocket::UnconnectedState) {
@@ -46,6 +66,7 @@ qint32 DeviceConnection::finishHandshake(QDeadlineTimer deadline)
         return PortlexError::Unreachable;
     if (m_socket->state() != QLocalSocket::ConnectedState && !m_socket->waitForConnected(deadline.remainingTime()))
         return fail(PortlexError::Unreachable, QStringLiteral("No device listens on %1").arg(m_socketPath));
+    Protocol::widenSocketBuffers(m_socket->socketDescriptor());
 
     QByteArray hello;
     PayloadStream out(&hello);
@@ -81,12 +102,12 @@ bool DeviceConnection::usable()
     if (!m_socket || !m_greeted || m_socket->state() != QLocalSocket::ConnectedState)
         return false;
     // A device that went away since the last call shows up as end of file now; bytes
-    // nobody asked for mean the stream is out of step. Either way, start afresh. One
+    // nobody asked for (or answers still owed to a cut pipeline) mean the stream is out of step. Either way, start afresh. One
     // non-blocking peek tells both apart from a healthy idle connection.
     char probe;
     const ssize_t peeked = ::recv(int(m_socket->socketDescriptor()), &probe, 1, MSG_PEEK | MSG_DONTWAIT);
     const bool idle = peeked < 0 && (errno == EAGAIN || errno == EWOULDBLOCK);
-    if (!idle || m_decoder.hasPartialFrame() || m_socket->bytesAvailable() > 0) {
+    if (!idle || !m_pending.empty() || m_decoder.hasPartialFrame() || m_socket->bytesAvailable() > 0) {
         m_socket.reset();
         return false;
     }
@@ -112,7 +133,7 @@ qint32 DeviceConnection::send(Operation operation, const QByteArray& request, Pr
     frame.requestId = m_nextRequestId++;
     frame.operation = quint32(operation);
     frame.payload = request;
-    m_pendingRequestId = frame.requestId;
+    m_pending.push_back(frame.requestId);
 
     const QByteArray bytes = frame.encode();
     if (m_socket->write(bytes) != bytes.size())
@@ -145,8 +166,9 @@ qint32 DeviceConnection::receive(Operation operation, QByteArray* body, QDeadlin
 
     // A refused handshake comes in the device's own version; everything else in ours.
     const bool versionOk = frame.version == Protocol::ProtocolVersion || operation == Operation::Hello;
-    if (!versionOk || frame.requestId != m_pendingRequestId || frame.operation != quint32(operation))
+    if (!versionOk || m_pending.empty() || frame.requestId != m_pending.front() || frame.operation != quint32(operation))
         return fail(PortlexError::ProtocolError, QStringLiteral("Answer does not match the request"));
+    m_pending.pop_front();
     PayloadStream in(frame.payload);
     qint32 result = 0;
     in >> result;
@@ -161,6 +183,7 @@ qint32 DeviceConnection::fail(qint32 code, const QString& message)
     m_error = message;
     m_greeted = false;
     m_decoder.clear();
+    m_pending.clear();
     m_socket.reset();
     return code;
 }

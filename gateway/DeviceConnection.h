@@ -6,6 +6,7 @@
 #include <QDeadlineTimer>
 #include <QString>
 
+#include <deque>
 #include <memory>
 
 class QLocalSocket;
@@ -27,6 +28,13 @@ public:
     // error code) and stores the answer's fields after the result in body.
     qint32 call(Operation operation, const QByteArray& request, Protocol::RequestFlags flags, QByteArray* body,
                 QDeadlineTimer deadline);
+
+    // Pipelining, for transfers: post sends a request without waiting for its answer;
+    // collect waits for the answer to the oldest posted request (answers come in request
+    // order). A failure of either drops the connection and every pending answer.
+    qint32 post(Operation operation, const QByteArray& request, QDeadlineTimer deadline);
+    qint32 collect(Operation operation, QByteArray* body, QDeadlineTimer deadline);
+    int pendingAnswers() const { return int(m_pending.size()); }
 
     // Discovery in two steps, so that many devices can be asked at once: start connects
     // and sends the handshake without waiting for it; finish waits for the answer.
@@ -51,7 +59,7 @@ private:
     std::unique_ptr<QLocalSocket> m_socket;
     FrameDecoder m_decoder;
     quint32 m_nextRequestId = 1;
-    quint32 m_pendingRequestId = 0;
+    std::deque<quint32> m_pending;  // request ids whose answers are still to come
     bool m_greeted = false;
     QString m_displayName;
     QString m_deviceId;

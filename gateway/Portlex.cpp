@@ -160,9 +160,3 @@ QString Portlex::LastStatus()
     QMutexLocker lock(&gateway().mutex);
     return gateway().lastStatus;
 }
-
-int Portlex::GetPlatformClassIds(const QString&, std::vector<MifEntry>& entries, PortlexProgressCallback, void*)
-{
-    entries.clear();
-    return PortlexError::NotImplemented;
-}

@@ -33,7 +33,11 @@ public:
     static unsigned LastError();
     static QString LastStatus();
 
-    // Collects the module entries of every MIF file below directory.
+    // Reads every MIF file below directory (suffix "mif" in any case) into entries, ordered
+    // by relative path; files that are not readable modules are skipped. callback (may be
+    // null) gets the range (-1, file count), then one step per file (index, file name), all
+    // on the calling thread; when it answers true the scan stops at once and entries stays
+    // empty, since a partial list would pass for the whole platform. Returns the entries count.
     static int GetPlatformClassIds(const QString& directory, std::vector<MifEntry>& entries,
                                    PortlexProgressCallback callback, void* context);
 };

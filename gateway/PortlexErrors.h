@@ -14,6 +14,7 @@ enum Client : int
     VersionMismatch = 1005,  // the device speaks another protocol version
     NotImplemented = 1006,   // operation not available in this version of the library
     InvalidArgument = 1007,  // a null record was passed, or a request too large for a frame
+    LocalFileError = 1008,   // the file on the PC could not be read or written
 };
 
 // Answered by the device side.
@@ -26,6 +27,9 @@ enum Device : int
     IoError = 1104,          // the device could not read or write its file
     UnknownOperation = 1105, // the device does not know the operation
     Refused = 1106,          // the device refuses the request (for instance a bad package)
+    NotRunnable = 1107,      // RunApplication of something that is not a .mod file
+    IsDirectory = 1108,      // a file transfer names a directory
+    TransferIncomplete = 1109, // a transfer ended with fewer or more bytes than announced
 };
 
 } // namespace PortlexError

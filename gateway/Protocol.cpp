@@ -4,6 +4,7 @@
 #include <QFileInfo>
 #include <QStandardPaths>
 
+#include <sys/socket.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -94,6 +95,13 @@ bool ensureSocketDirectory(const QString& directory, QString* error)
         return false;
     }
     return true;
+}
+
+void widenSocketBuffers(qintptr descriptor)
+{
+    const int bytes = int(4 * TransferChunkSize);
+    ::setsockopt(int(descriptor), SOL_SOCKET, SO_SNDBUF, &bytes, sizeof bytes);
+    ::setsockopt(int(descriptor), SOL_SOCKET, SO_RCVBUF, &bytes, sizeof bytes);
 }
 
 } // namespace Protocol

@@ -76,7 +76,10 @@ enum class Operation : quint32
 
     // --- actions -------------------------------------------------------------------------
     // Transfers are bound to their connection: a connection that closes aborts its open
-    // transfers, and the device removes their temporary files.
+    // transfers, and the device removes their temporary files. The client keeps a few chunk
+    // requests in flight (answers come back in request order), so a transfer is not bound
+    // by round trips; each chunk has the call timeout of its own. A chunk the device fails
+    // ends its transfer.
     //
     // Copy from the device: the device opens the file and streams it.
     // request: QString devicePath             answer: quint32 transferId, quint64 size
@@ -100,7 +103,7 @@ enum class Operation : quint32
     // Package installation: the package is uploaded with UploadChunk, then extracted into
     // the volume's module folder on commit.
     // request: quint16 volumeId, QString packageName, quint64 size
-    // answer:  quint32 transferId, then QString statusText whatever the result
+    // answer:  quint32 transferId (on success only), then QString statusText whatever the result
     InstallPackageBegin = 37,
     // request: quint32 transferId             answer: QString statusText whatever the result
     InstallPackageCommit = 38,
@@ -148,6 +151,9 @@ QString socketDirectory();
 // Creates the folder with mode 0700 (or tightens an existing one of ours to 0700).
 // Refuses a folder that is a link or belongs to another user.
 bool ensureSocketDirectory(const QString& directory, QString* error);
+// Lets a connected socket hold a few transfer chunks in the kernel, so that a chunk does
+// not need many wake-ups of both sides to pass.
+void widenSocketBuffers(qintptr descriptor);
 
 } // namespace Protocol
 

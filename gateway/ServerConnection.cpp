@@ -11,6 +11,7 @@ ServerConnection::ServerConnection(QLocalSocket* socket, quint64 id, RequestHand
     : QObject(parent), m_socket(socket), m_id(id), m_handler(handler), m_latencyMs(latencyMs)
 {
     m_socket->setParent(this);
+    Protocol::widenSocketBuffers(m_socket->socketDescriptor());
     connect(m_socket, &QLocalSocket::readyRead, this, &ServerConnection::onReadyRead);
     connect(m_socket, &QLocalSocket::disconnected, this, &ServerConnection::onDisconnected);
     m_halfOpenTimer.setSingleShot(true);

@@ -5,8 +5,11 @@
 #include "PortlexErrors.h"
 #include "RecordStreams.h"
 #include "ThreadConnections.h"
+#include "TransferPipeline.h"
 
+#include <QFileInfo>
 #include <QMutexLocker>
+#include <QSaveFile>
 
 namespace {
 
@@ -238,27 +241,96 @@ EnablementStatus _ZantDevice::enablement(Operation operation, QString& mode, QSt
     return EnablementStatus(status);
 }
 
-int _ZantDevice::CopyFileToPC(const QString&, const QString&)
+int _ZantDevice::upload(quint32 transferId, QIODevice& source)
 {
-    return PortlexError::NotImplemented;
+    DeviceConnection& connection = ThreadConnections::forDevice(m_lifetime, socketPath());
+    const int result = TransferPipeline(connection).upload(transferId, source, quint64(source.size()));
+    if (result == PortlexError::LocalFileError) {
+        QByteArray body;
+        call(Operation::UploadAbort, pack(transferId), &body);
+    }
+    return result;
 }
 
-int _ZantDevice::CopyFileToDevice(const QString&, const QString&)
+int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPath)
 {
-    return PortlexError::NotImplemented;
+    quint32 transferId = 0;
+    quint64 size = 0;
+    int result = query(Operation::CopyToPCBegin, pack(devicePath), transferId, size);
+    if (result != 0)
+        return result;
+    QSaveFile sink(localPath);
+    if (sink.open(QIODevice::WriteOnly)) {
+        DeviceConnection& connection = ThreadConnections::forDevice(m_lifetime, socketPath());
+        result = TransferPipeline(connection).download(transferId, sink, size);
+    } else {
+        result = PortlexError::LocalFileError;
+    }
+    QByteArray body;
+    const int ended = call(Operation::CopyToPCEnd, pack(transferId), &body);
+    if (result == 0)
+        result = ended;
+    if (result != 0) {
+        sink.cancelWriting();
+        return result;
+    }
+    return sink.commit() ? 0 : int(PortlexError::LocalFileError);
 }
 
-int _ZantDevice::InstallPackage(const QString&, unsigned short)
+int _ZantDevice::CopyFileToDevice(const QString& localPath, const QString& devicePath)
 {
-    return PortlexError::NotImplemented;
+    QFile source(localPath);
+    if (!QFileInfo(localPath).isFile() || !source.open(QIODevice::ReadOnly))
+        return PortlexError::LocalFileError;
+    quint32 transferId = 0;
+    int result = query(Operation::CopyToDeviceBegin, pack(devicePath, quint64(source.size())), transferId);
+    if (result != 0)
+        return result;
+    result = upload(transferId, source);
+    if (result != 0)
+        return result;
+    QByteArray body;
+    return call(Operation::CopyToDeviceCommit, pack(transferId), &body);
 }
 
-int _ZantDevice::RunApplication(const QString&)
+int _ZantDevice::InstallPackage(const QString& localPath, unsigned short volumeId)
 {
-    return PortlexError::NotImplemented;
+    QFile package(localPath);
+    if (!QFileInfo(localPath).isFile() || !package.open(QIODevice::ReadOnly)) {
+        statusText = QStringLiteral("Cannot read the package %1").arg(localPath);
+        return PortlexError::LocalFileError;
+    }
+    const QString name = QFileInfo(localPath).fileName();
+    QByteArray body;
+    int result = call(Operation::InstallPackageBegin, pack(volumeId, name, quint64(package.size())), &body);
+    quint32 transferId = 0;
+    QString status;
+    PayloadStream begun(body);
+    if (result == 0)
+        begun >> transferId;
+    begun >> status;
+    if (result == 0 && begun.ok())
+        result = upload(transferId, package);
+    if (result == 0) {
+        result = call(Operation::InstallPackageCommit, pack(transferId), &body);
+        PayloadStream committed(body);
+        committed >> status;
+    }
+    if (status.isEmpty())
+        status = result == 0 ? QStringLiteral("%1 installed").arg(name)
+                             : QStringLiteral("The package %1 was not installed (error %2)").arg(name).arg(result);
+    statusText = status;
+    return result;
 }
 
-int _ZantDevice::DeleteDeviceFile(const QString&)
+int _ZantDevice::RunApplication(const QString& devicePath)
 {
-    return PortlexError::NotImplemented;
+    QByteArray body;
+    return call(Operation::RunApplication, pack(devicePath), &body);
+}
+
+int _ZantDevice::DeleteDeviceFile(const QString& devicePath)
+{
+    QByteArray body;
+    return call(Operation::DeleteDeviceFile, pack(devicePath), &body);
 }

@@ -15,6 +15,7 @@
 #include "MifEntry.h"
 #include "PriviledgeRecord.h"
 
+#include <QIODevice>
 #include <QMutex>
 #include <QSet>
 #include <QSharedPointer>
@@ -61,10 +62,16 @@ public:
     EnablementStatus TepStatus(QString& mode, QString& owner, QString& expiry);
     EnablementStatus GlobalTestSigStatus(QString& mode, QString& owner, QString& expiry);
 
+    // Transfers stream in chunks and land under a temporary name that is renamed when
+    // complete: a failed or cut copy leaves no partial file on either side.
     int CopyFileToPC(const QString& devicePath, const QString& localPath);
     int CopyFileToDevice(const QString& localPath, const QString& devicePath);
+    // Sends a .zantro package to be extracted into the volume's install folder; statusText
+    // tells the outcome (why it was refused, on failure).
     int InstallPackage(const QString& localPath, unsigned short volumeId);
+    // Starts the .mod file at devicePath as a process of the device.
     int RunApplication(const QString& devicePath);
+    // A file, a link (not what it names), or a directory with its contents.
     int DeleteDeviceFile(const QString& devicePath);
 
 private:
@@ -81,6 +88,9 @@ private:
     template <typename... Fields>
     int query(Operation operation, const QByteArray& request, Fields&... fields);
     EnablementStatus enablement(Operation operation, QString& mode, QString& owner, QString& expiry);
+    // Streams source into the open upload transferId; aborts it on the device when the
+    // local file fails.
+    int upload(quint32 transferId, QIODevice& source);
 
     mutable QMutex m_mutex;
     QString m_socketPath;

@@ -7,6 +7,8 @@
 #include <QDirIterator>
 #include <QFileInfo>
 
+#include <algorithm>
+
 namespace {
 
 const SettingsNodeSpec* findSettingsNode(const SettingsNodeSpec& root, const QString& path)
@@ -176,17 +178,31 @@ quint64 DeviceState::usedBytes(int volume)
     return quint64(m_usedBytes.at(volume));
 }
 
+quint64 DeviceState::freeSpace(int volume)
+{
+    const VolumeSpec& spec = m_profile.volumes.at(volume);
+    const quint64 taken = spec.reserved + usedBytes(volume);
+    return taken >= spec.size ? 0 : spec.size - taken;
+}
+
+quint32 DeviceState::startProcess(const ProcessSpec& spec, int lifetimeMs)
+{
+    // Catch up first, so that steps owed from the past do not age the new process.
+    advanceClock();
+    const int interval = std::max(1, m_profile.evolution.intervalMs);
+    return m_processes->start(spec, (lifetimeMs + interval - 1) / interval);
+}
+
 QList<VolumeInfo> DeviceState::volumes()
 {
     QList<VolumeInfo> list;
     for (int i = 0; i < m_profile.volumes.size(); ++i) {
         const VolumeSpec& spec = m_profile.volumes.at(i);
-        const quint64 taken = spec.reserved + usedBytes(i);
         VolumeInfo info;
         info.friendlyName = spec.friendlyName;
         info.mountPoint = spec.mountPoint;
         info.volumeSize = spec.size;
-        info.freeSpace = taken >= spec.size ? 0 : spec.size - taken;
+        info.freeSpace = freeSpace(i);
         info.mounted = spec.mounted;
         info.removable = spec.removable;
         info.volumeId = spec.id;

@@ -55,6 +55,12 @@ public:
     // Files changed on a volume: modules, classes, registry and free space follow.
     void filesChanged();
 
+    // For the actions: where device paths lead, and the room left on a volume.
+    const VolumePathResolver& resolver() const { return m_resolver; }
+    quint64 freeSpace(int volume);
+    // Starts a process that ends after about lifetimeMs. Returns its id.
+    quint32 startProcess(const ProcessSpec& spec, int lifetimeMs);
+
 private:
     // File attribute text: 'r', 'w' or '-', 'x' for runnable modules, 'h' hidden, 's' in a
     // system module folder (never writable there).

@@ -21,6 +21,7 @@ QString SimOptions::helpText()
         "  zantro-sim make-sample DESCRIPTION IMAGE\n"
         "                                        write the modules and files a sample\n"
         "                                        description lists into IMAGE\n"
+        "  zantro-sim pack DIR OUT.zantro        build a package from the module folder DIR\n"
         "\n"
         "Serving options:\n"
         "  --image DIR            the device image: DIR/device.xml and one folder per volume\n"
@@ -32,6 +33,8 @@ QString SimOptions::helpText()
         "  --refuse-connect CODE:TEXT\n"
         "                         answer every Connect with result CODE and status TEXT\n"
         "  --latency MS           delay every answer by MS milliseconds\n"
+        "  --run-lifetime MS      how long a process started by RunApplication lives\n"
+        "                         (default 10000)\n"
         "  --fail OP[:PATH]=CODE  make operation OP answer CODE (decimal or 0x...), for every\n"
         "                         request or only for those naming exactly PATH; repeatable.\n"
         "                         e.g. GetRegistry=3, GetChildSettings:/appinfo=0xDEADBEEF,\n"
@@ -52,6 +55,14 @@ bool SimOptions::parse(const QStringList& arguments)
         return parseGenerate(arguments);
     if (first == QLatin1String("make-sample"))
         return parseMakeSample(arguments);
+    if (first == QLatin1String("pack")) {
+        if (arguments.size() != 4)
+            return fail(QStringLiteral("pack expects DIR OUT.zantro"));
+        command = Command::Pack;
+        descriptionPath = arguments.at(2);
+        outputDir = arguments.at(3);
+        return true;
+    }
     return parseServe(arguments);
 }
 
@@ -66,8 +77,9 @@ bool SimOptions::parseServe(const QStringList& arguments)
     const QCommandLineOption refuse(QStringLiteral("refuse-connect"), QString(), QStringLiteral("CODE:TEXT"));
     const QCommandLineOption latency(QStringLiteral("latency"), QString(), QStringLiteral("MS"));
     const QCommandLineOption failOption(QStringLiteral("fail"), QString(), QStringLiteral("RULE"));
+    const QCommandLineOption lifetime(QStringLiteral("run-lifetime"), QString(), QStringLiteral("MS"));
     const QCommandLineOption help(QStringList{QStringLiteral("help"), QStringLiteral("h")});
-    parser.addOptions({image, id, socketDirOption, names, resetOption, refuse, latency, failOption, help});
+    parser.addOptions({image, id, socketDirOption, names, resetOption, refuse, latency, failOption, lifetime, help});
     if (!parser.parse(arguments))
         return fail(parser.errorText());
     if (parser.isSet(help)) {
@@ -100,6 +112,12 @@ bool SimOptions::parseServe(const QStringList& arguments)
         latencyMs = parser.value(latency).toInt(&ok);
         if (!ok || latencyMs < 0 || latencyMs > 600000)
             return fail(QStringLiteral("--latency expects milliseconds between 0 and 600000"));
+    }
+    if (parser.isSet(lifetime)) {
+        bool ok = false;
+        runLifetimeMs = parser.value(lifetime).toInt(&ok);
+        if (!ok || runLifetimeMs < 1 || runLifetimeMs > 3600000)
+            return fail(QStringLiteral("--run-lifetime expects milliseconds between 1 and 3600000"));
     }
     const QStringList operations = SimRequestHandler::operationNames();
     for (const QString& rule : parser.values(failOption)) {

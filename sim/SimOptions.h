@@ -1,5 +1,6 @@
 #pragma once
 
+#include "DeviceActions.h"
 #include "FailurePlan.h"
 #include "ImageGenerator.h"
 
@@ -15,6 +16,7 @@ public:
         Serve,
         Generate,
         MakeSample,
+        Pack,
         Help,
     };
 
@@ -34,9 +36,11 @@ public:
     qint32 refuseCode = 0;
     QString refuseText;
     int latencyMs = 0;
+    int runLifetimeMs = DeviceActions::DefaultRunLifetimeMs;
     FailurePlan failures;
 
-    // Generate (into outputDir) and MakeSample (descriptionPath into outputDir)
+    // Generate (into outputDir), MakeSample (descriptionPath into outputDir) and Pack
+    // (the module folder descriptionPath into the package outputDir)
     QString outputDir;
     QString descriptionPath;
     ImageGenerator::Counts counts;

@@ -26,7 +26,7 @@ Answer statusFailure(qint32 code, const QString& statusText)
 } // namespace
 
 SimRequestHandler::SimRequestHandler(DeviceState& state)
-    : m_state(state)
+    : m_state(state), m_actions(state)
 {
 }
 
@@ -145,6 +145,8 @@ Answer SimRequestHandler::serve(const Request& request, const QString& path)
     case Operation::GlobalTestSigStatus:
         return enablement(false);
     default:
+        if (DeviceActions::isAction(request.operation))
+            return m_actions.handle(request);
         return Answer::failure(PortlexError::UnknownOperation);
     }
 }

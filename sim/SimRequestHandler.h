@@ -1,5 +1,6 @@
 #pragma once
 
+#include "DeviceActions.h"
 #include "FailurePlan.h"
 #include "RequestHandler.h"
 
@@ -18,10 +19,12 @@ public:
     // A refused Connect answers code with text as its status.
     void refuseConnect(qint32 code, const QString& text);
     void setFailurePlan(const FailurePlan& plan) { m_failures = plan; }
+    DeviceActions& actions() { return m_actions; }
 
     QString displayName() const override;
     QString deviceId() const override;
     Answer handle(const Request& request) override;
+    void connectionClosed(quint64 connectionId) override { m_actions.connectionClosed(connectionId); }
 
     // The operations a request can carry, and their names (what --fail may name).
     static QList<Operation> operations();
@@ -35,6 +38,7 @@ private:
     Answer enablement(bool service);
 
     DeviceState& m_state;
+    DeviceActions m_actions;
     FailurePlan m_failures;
     qint32 m_refuseCode = 0;
     QString m_refuseText;

@@ -55,6 +55,8 @@ bool SimulatorDaemon::start(const SimOptions& options)
     if (options.refuseCode != 0)
         m_handler->refuseConnect(options.refuseCode, options.refuseText);
     m_handler->setFailurePlan(options.failures);
+    m_handler->actions().setRunLifetime(options.runLifetimeMs);
+    m_handler->actions().sweepLeftovers();
 
     auto* signalPipe = new SignalPipe(this);
     if (!signalPipe->install())

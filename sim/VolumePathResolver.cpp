@@ -124,6 +124,19 @@ VolumePathResolver::Status VolumePathResolver::resolveExisting(const QString& de
 
 VolumePathResolver::Status VolumePathResolver::resolveForCreate(const QString& devicePath, Target& out) const
 {
+    Target entry;
+    const Status status = resolveEntry(devicePath, entry);
+    if (status != Status::Ok)
+        return status;
+    const QFileInfo info(entry.localPath);
+    if (info.isSymLink() && !within(entry.volume, info.canonicalFilePath()))
+        return Status::Escapes;
+    out = entry;
+    return Status::Ok;
+}
+
+VolumePathResolver::Status VolumePathResolver::resolveEntry(const QString& devicePath, Target& out) const
+{
     int volume = -1;
     QStringList components;
     const Status status = split(devicePath, volume, components);
@@ -140,13 +153,8 @@ VolumePathResolver::Status VolumePathResolver::resolveForCreate(const QString& d
     if (!QFileInfo(parent.localPath).isDir())
         return Status::NotFound;
 
-    const QString local = parent.localPath + QLatin1Char('/') + name;
-    const QFileInfo info(local);
-    if (info.isSymLink() && !within(volume, info.canonicalFilePath()))
-        return Status::Escapes;
-
     out.volume = volume;
     out.devicePath = joinDevicePath(parent.devicePath, name);
-    out.localPath = local;
+    out.localPath = parent.localPath + QLatin1Char('/') + name;
     return Status::Ok;
 }

@@ -40,6 +40,10 @@ public:
     // is a link it must point inside.
     Status resolveForCreate(const QString& devicePath, Target& out) const;
 
+    // The parent must exist inside the volume; the target itself is not followed, so a
+    // link names the link (for deleting it).
+    Status resolveEntry(const QString& devicePath, Target& out) const;
+
     // True when localPath, made canonical, lies in the volume's folder. False for dangling links.
     bool isInside(int volume, const QString& localPath) const;
 

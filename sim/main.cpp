@@ -1,4 +1,5 @@
 #include "ImageGenerator.h"
+#include "PackageWriter.h"
 #include "PlatformGenerator.h"
 #include "SampleBuilder.h"
 #include "SimOptions.h"
@@ -39,6 +40,14 @@ int main(int argc, char* argv[])
         SampleBuilder builder;
         if (!builder.build(options.descriptionPath, options.outputDir)) {
             err << "zantro-sim make-sample: " << builder.errorString() << "\n";
+            return 1;
+        }
+        return 0;
+    }
+    case SimOptions::Command::Pack: {
+        QString error;
+        if (!PackageWriter::pack(options.descriptionPath, options.outputDir, &error)) {
+            err << "zantro-sim pack: " << error << "\n";
             return 1;
         }
         return 0;

@@ -1,0 +1,108 @@
+#include "TransferPipeline.h"
+
+#include "DeviceConnection.h"
+#include "PayloadStream.h"
+#include "PortlexErrors.h"
+
+#include <QIODevice>
+
+#include <algorithm>
+
+namespace {
+
+QDeadlineTimer chunkDeadline()
+{
+    return QDeadlineTimer(Protocol::CallTimeoutMs);
+}
+
+QByteArray chunkRequest(quint32 transferId, const char* data, qint64 length)
+{
+    QByteArray request;
+    request.reserve(int(length) + 16);
+    PayloadStream out(&request);
+    out << transferId;
+    out.writeBytes(data, uint(length));  // the QByteArray encoding, without a copy
+    return request;
+}
+
+} // namespace
+
+TransferPipeline::TransferPipeline(DeviceConnection& connection)
+    : m_connection(connection)
+{
+}
+
+qint32 TransferPipeline::upload(quint32 transferId, QIODevice& source, quint64 size)
+{
+    QByteArray buffer(int(Protocol::TransferChunkSize), Qt::Uninitialized);
+    quint64 sent = 0;
+    while (sent < size) {
+        const qint64 wanted = qint64(std::min<quint64>(size - sent, Protocol::TransferChunkSize));
+        const qint64 got = source.read(buffer.data(), wanted);
+        if (got != wanted) {
+            const qint32 pending = drain();
+            return pending != 0 ? pending : qint32(PortlexError::LocalFileError);
+        }
+        qint32 result = m_connection.post(Operation::UploadChunk, chunkRequest(transferId, buffer.constData(), got),
+                                          chunkDeadline());
+        if (result != 0)
+            return result;
+        sent += quint64(got);
+        if (m_connection.pendingAnswers() >= Window) {
+            QByteArray body;
+            result = m_connection.collect(Operation::UploadChunk, &body, chunkDeadline());
+            if (result != 0)
+                return result;
+        }
+    }
+    return drain();
+}
+
+qint32 TransferPipeline::drain()
+{
+    qint32 first = 0;
+    while (m_connection.pendingAnswers() > 0) {
+        QByteArray body;
+        const qint32 result = m_connection.collect(Operation::UploadChunk, &body, chunkDeadline());
+        if (first == 0)
+            first = result;
+    }
+    return first;
+}
+
+qint32 TransferPipeline::download(quint32 transferId, QIODevice& sink, quint64 size)
+{
+    quint64 requested = 0;
+    quint64 received = 0;
+    while (received < size) {
+        while (requested < size && m_connection.pendingAnswers() < Window) {
+            const quint32 wanted = quint32(std::min<quint64>(size - requested, Protocol::TransferChunkSize));
+            QByteArray request;
+            PayloadStream out(&request);
+            out << transferId << wanted;
+            const qint32 result = m_connection.post(Operation::CopyToPCChunk, request, chunkDeadline());
+            if (result != 0)
+                return result;
+            requested += wanted;
+        }
+        QByteArray body;
+        const qint32 result = m_connection.collect(Operation::CopyToPCChunk, &body, chunkDeadline());
+        if (result != 0)
+            return result;
+        PayloadStream in(body);
+        QByteArray bytes;
+        in >> bytes;
+        if (!in.ok() || quint64(bytes.size()) > size - received)
+            return PortlexError::ProtocolError;
+        if (bytes.isEmpty()) {
+            // The file shrank on the device: what is pending is empty as well.
+            while (m_connection.pendingAnswers() > 0)
+                m_connection.collect(Operation::CopyToPCChunk, &body, chunkDeadline());
+            return PortlexError::TransferIncomplete;
+        }
+        if (sink.write(bytes) != bytes.size())
+            return PortlexError::LocalFileError;
+        received += quint64(bytes.size());
+    }
+    return 0;
+}

@@ -1,0 +1,358 @@
+#include "DeviceActions.h"
+
+#include "DeviceState.h"
+#include "PackageInstaller.h"
+#include "PortlexErrors.h"
+
+#include <QDir>
+#include <QFileInfo>
+
+#include <algorithm>
+#include <cstdio>
+
+namespace {
+
+qint32 codeFor(VolumePathResolver::Status status)
+{
+    return status == VolumePathResolver::Status::NotFound || status == VolumePathResolver::Status::NoVolume
+        ? qint32(PortlexError::NotFound)
+        : qint32(PortlexError::PathRefused);
+}
+
+// Installation answers carry a status text whatever the result.
+Answer statusFailure(qint32 code, const QString& statusText)
+{
+    QByteArray body;
+    PayloadStream out(&body);
+    out << statusText;
+    return Answer::failure(code, body);
+}
+
+bool isDirectory(const QString& localPath)
+{
+    const QFileInfo info(localPath);
+    return info.isDir() && !info.isSymLink();
+}
+
+} // namespace
+
+DeviceActions::DeviceActions(DeviceState& state)
+    : m_state(state)
+{
+}
+
+bool DeviceActions::isAction(Operation operation)
+{
+    return quint32(operation) >= quint32(Operation::CopyToPCBegin) && quint32(operation) <= quint32(Operation::DeleteDeviceFile);
+}
+
+Answer DeviceActions::handle(const Request& request)
+{
+    switch (request.operation) {
+    case Operation::CopyToPCBegin:
+        return copyToPCBegin(request);
+    case Operation::CopyToPCChunk:
+        return copyToPCChunk(request);
+    case Operation::CopyToPCEnd:
+        return endTransfer(request, TransferTable::Kind::Download);
+    case Operation::CopyToDeviceBegin:
+        return copyToDeviceBegin(request);
+    case Operation::UploadChunk:
+        return uploadChunk(request);
+    case Operation::CopyToDeviceCommit:
+        return copyToDeviceCommit(request);
+    case Operation::UploadAbort: {
+        // Either kind of upload may be abandoned by its client.
+        const Answer upload = endTransfer(request, TransferTable::Kind::Upload);
+        return upload.result == 0 ? upload : endTransfer(request, TransferTable::Kind::Package);
+    }
+    case Operation::InstallPackageBegin:
+        return installBegin(request);
+    case Operation::InstallPackageCommit:
+        return installCommit(request);
+    case Operation::RunApplication:
+        return run(request);
+    case Operation::DeleteDeviceFile:
+        return remove(request);
+    default:
+        return Answer::failure(PortlexError::UnknownOperation);
+    }
+}
+
+quint64 DeviceActions::roomLeft(int volume)
+{
+    const quint64 free = m_state.freeSpace(volume);
+    const quint64 promised = m_transfers.reservedBytes(volume);
+    return promised >= free ? 0 : free - promised;
+}
+
+void DeviceActions::sweepLeftovers()
+{
+    int removed = 0;
+    for (int volume = 0; volume < m_state.resolver().mountCount(); ++volume)
+        removed += TransferTable::sweep(m_state.resolver().rootFolder(volume));
+    if (removed > 0)
+        m_state.filesChanged();
+}
+
+Answer DeviceActions::copyToPCBegin(const Request& request)
+{
+    PayloadStream in(request.payload);
+    QString path;
+    in >> path;
+    if (!in.ok())
+        return Answer::failure(PortlexError::BadRequest);
+    VolumePathResolver::Target target;
+    const VolumePathResolver::Status status = m_state.resolver().resolveExisting(path, target);
+    if (status != VolumePathResolver::Status::Ok)
+        return Answer::failure(codeFor(status));
+    if (QFileInfo(target.localPath).isDir())
+        return Answer::failure(PortlexError::IsDirectory);
+    if (m_transfers.full(request.connectionId))
+        return Answer::failure(PortlexError::Refused);
+    TransferTable::Transfer transfer;
+    transfer.connectionId = request.connectionId;
+    transfer.kind = TransferTable::Kind::Download;
+    transfer.file = std::make_unique<QFile>(target.localPath);
+    if (!transfer.file->open(QIODevice::ReadOnly))
+        return Answer::failure(PortlexError::IoError);
+    transfer.size = quint64(transfer.file->size());
+    transfer.volume = target.volume;
+    const quint64 size = transfer.size;
+    return Answer::success(m_transfers.add(std::move(transfer)), size);
+}
+
+Answer DeviceActions::copyToPCChunk(const Request& request)
+{
+    PayloadStream in(request.payload);
+    quint32 id = 0;
+    quint32 maxBytes = 0;
+    in >> id >> maxBytes;
+    if (!in.ok())
+        return Answer::failure(PortlexError::BadRequest);
+    TransferTable::Transfer* transfer = m_transfers.find(id, request.connectionId, TransferTable::Kind::Download);
+    if (!transfer)
+        return Answer::failure(PortlexError::NotFound);
+    QByteArray bytes(int(std::min(maxBytes, Protocol::TransferChunkSize)), Qt::Uninitialized);
+    const qint64 got = transfer->file->read(bytes.data(), bytes.size());
+    if (got < 0) {
+        m_transfers.discard(id);
+        return Answer::failure(PortlexError::IoError);
+    }
+    bytes.truncate(int(got));
+    transfer->done += quint64(got);
+    return Answer::success(bytes);
+}
+
+Answer DeviceActions::endTransfer(const Request& request, TransferTable::Kind kind)
+{
+    PayloadStream in(request.payload);
+    quint32 id = 0;
+    in >> id;
+    if (!in.ok())
+        return Answer::failure(PortlexError::BadRequest);
+    if (!m_transfers.find(id, request.connectionId, kind))
+        return Answer::failure(PortlexError::NotFound);
+    m_transfers.discard(id);
+    return Answer();
+}
+
+Answer DeviceActions::copyToDeviceBegin(const Request& request)
+{
+    PayloadStream in(request.payload);
+    QString path;
+    quint64 size = 0;
+    in >> path >> size;
+    if (!in.ok())
+        return Answer::failure(PortlexError::BadRequest);
+    VolumePathResolver::Target target;
+    const VolumePathResolver::Status status = m_state.resolver().resolveForCreate(path, target);
+    if (status != VolumePathResolver::Status::Ok)
+        return Answer::failure(codeFor(status));
+    if (isDirectory(target.localPath))
+        return Answer::failure(PortlexError::IsDirectory);
+    // A file that is replaced gives its room back.
+    const QFileInfo existing(target.localPath);
+    const quint64 replaced = existing.isFile() && !existing.isSymLink() ? quint64(existing.size()) : 0;
+    if (size > roomLeft(target.volume) + replaced)
+        return Answer::failure(PortlexError::NoSpace);
+    if (m_transfers.full(request.connectionId))
+        return Answer::failure(PortlexError::Refused);
+
+    TransferTable::Transfer transfer;
+    transfer.connectionId = request.connectionId;
+    transfer.kind = TransferTable::Kind::Upload;
+    transfer.file = TransferTable::createPartial(QFileInfo(target.localPath).path());
+    if (!transfer.file)
+        return Answer::failure(PortlexError::IoError);
+    transfer.targetPath = target.localPath;
+    transfer.volume = target.volume;
+    transfer.size = size;
+    return Answer::success(m_transfers.add(std::move(transfer)));
+}
+
+Answer DeviceActions::uploadChunk(const Request& request)
+{
+    PayloadStream in(request.payload);
+    quint32 id = 0;
+    QByteArray bytes;
+    in >> id >> bytes;
+    if (!in.ok())
+        return Answer::failure(PortlexError::BadRequest);
+    TransferTable::Transfer* transfer = m_transfers.find(id, request.connectionId, TransferTable::Kind::Upload);
+    if (!transfer)
+        transfer = m_transfers.find(id, request.connectionId, TransferTable::Kind::Package);
+    if (!transfer)
+        return Answer::failure(PortlexError::NotFound);
+    if (quint64(bytes.size()) > transfer->size - transfer->done) {
+        m_transfers.discard(id);
+        return Answer::failure(PortlexError::TransferIncomplete);
+    }
+    if (transfer->file->write(bytes) != bytes.size()) {
+        m_transfers.discard(id);
+        return Answer::failure(PortlexError::IoError);
+    }
+    transfer->done += quint64(bytes.size());
+    return Answer();
+}
+
+Answer DeviceActions::copyToDeviceCommit(const Request& request)
+{
+    PayloadStream in(request.payload);
+    quint32 id = 0;
+    in >> id;
+    if (!in.ok())
+        return Answer::failure(PortlexError::BadRequest);
+    TransferTable::Transfer* transfer = m_transfers.find(id, request.connectionId, TransferTable::Kind::Upload);
+    if (!transfer)
+        return Answer::failure(PortlexError::NotFound);
+    if (transfer->done != transfer->size) {
+        m_transfers.discard(id);
+        return Answer::failure(PortlexError::TransferIncomplete);
+    }
+    transfer->file->close();
+    const bool written = transfer->file->error() == QFileDevice::NoError;
+    // rename() replaces the target in one step; a link in its place is replaced, not followed.
+    if (!written
+        || std::rename(QFile::encodeName(transfer->file->fileName()).constData(),
+                       QFile::encodeName(transfer->targetPath).constData()) != 0) {
+        m_transfers.discard(id);
+        m_state.filesChanged();
+        return Answer::failure(PortlexError::IoError);
+    }
+    m_transfers.take(id);
+    m_state.filesChanged();
+    return Answer();
+}
+
+Answer DeviceActions::installBegin(const Request& request)
+{
+    PayloadStream in(request.payload);
+    quint16 volumeId = 0;
+    QString name;
+    quint64 size = 0;
+    in >> volumeId >> name >> size;
+    if (!in.ok())
+        return statusFailure(PortlexError::BadRequest, QStringLiteral("The install request could not be read"));
+
+    const QList<VolumeSpec>& volumes = m_state.profile().volumes;
+    const auto volume = std::find_if(volumes.cbegin(), volumes.cend(),
+                                     [volumeId](const VolumeSpec& v) { return quint16(v.id) == volumeId; });
+    if (volume == volumes.cend())
+        return statusFailure(PortlexError::NotFound, QStringLiteral("Package %1 refused: there is no volume %2").arg(name).arg(volumeId));
+    const QString installPath = VolumePathResolver::joinDevicePath(volume->mountPoint, volume->installFolder);
+    VolumePathResolver::Target target;
+    if (m_state.resolver().resolveExisting(installPath, target) != VolumePathResolver::Status::Ok
+        || !isDirectory(target.localPath))
+        return statusFailure(PortlexError::NotFound, QStringLiteral("Package %1 refused: the volume has no install folder").arg(name));
+    const quint64 room = roomLeft(target.volume);
+    if (size > room)
+        return statusFailure(PortlexError::NoSpace,
+                             QStringLiteral("Package %1 refused: it takes %2 bytes and the volume has %3 bytes free")
+                                 .arg(name).arg(size).arg(room));
+    if (m_transfers.full(request.connectionId))
+        return statusFailure(PortlexError::Refused, QStringLiteral("Package %1 refused: too many transfers are open").arg(name));
+
+    TransferTable::Transfer transfer;
+    transfer.connectionId = request.connectionId;
+    transfer.kind = TransferTable::Kind::Package;
+    transfer.file = TransferTable::createPartial(target.localPath);
+    if (!transfer.file)
+        return statusFailure(PortlexError::IoError, QStringLiteral("Package %1 refused: the install folder cannot be written").arg(name));
+    transfer.targetPath = target.localPath;
+    transfer.name = name;
+    transfer.volume = target.volume;
+    transfer.size = size;
+    return Answer::success(m_transfers.add(std::move(transfer)), QStringLiteral("Receiving package %1").arg(name));
+}
+
+Answer DeviceActions::installCommit(const Request& request)
+{
+    PayloadStream in(request.payload);
+    quint32 id = 0;
+    in >> id;
+    if (!in.ok())
+        return statusFailure(PortlexError::BadRequest, QStringLiteral("The install request could not be read"));
+    if (!m_transfers.find(id, request.connectionId, TransferTable::Kind::Package))
+        return statusFailure(PortlexError::NotFound, QStringLiteral("No package is being received"));
+    TransferTable::Transfer transfer = m_transfers.take(id);
+    transfer.file->close();
+    if (transfer.done != transfer.size || transfer.file->error() != QFileDevice::NoError) {
+        transfer.file->remove();
+        return statusFailure(PortlexError::TransferIncomplete, QStringLiteral("Package %1 arrived incomplete").arg(transfer.name));
+    }
+    QString status;
+    const bool installed = PackageInstaller::install(transfer.file->fileName(), transfer.name, transfer.targetPath,
+                                                     roomLeft(transfer.volume), &status);
+    transfer.file->remove();
+    m_state.filesChanged();
+    return installed ? Answer::success(status) : statusFailure(PortlexError::Refused, status);
+}
+
+Answer DeviceActions::run(const Request& request)
+{
+    PayloadStream in(request.payload);
+    QString path;
+    in >> path;
+    if (!in.ok())
+        return Answer::failure(PortlexError::BadRequest);
+    VolumePathResolver::Target target;
+    const VolumePathResolver::Status status = m_state.resolver().resolveExisting(path, target);
+    if (status != VolumePathResolver::Status::Ok)
+        return Answer::failure(codeFor(status));
+    const QFileInfo module(target.localPath);
+    if (!module.isFile() || module.suffix().compare(QLatin1String("mod"), Qt::CaseInsensitive) != 0)
+        return Answer::failure(PortlexError::NotRunnable);
+
+    const QString name = QFileInfo(target.devicePath).completeBaseName();
+    ProcessSpec spec;
+    spec.name = name;
+    spec.threads = { { name + QStringLiteral("::Main"), 100, 1 }, { name + QStringLiteral("::UI"), 90, 2 },
+                     { name + QStringLiteral("::Timer"), 80, 2 } };
+    spec.modules = { { QFileInfo(target.devicePath).fileName(), target.devicePath, quint32(module.size()), false },
+                     { QStringLiteral("zcore.lib"), QStringLiteral("/sys/lib/zcore.lib"), 412160, false },
+                     { QStringLiteral("zui.lib"), QStringLiteral("/sys/lib/zui.lib"), 258048, false } };
+    m_state.startProcess(spec, m_runLifetimeMs);
+    return Answer();
+}
+
+Answer DeviceActions::remove(const Request& request)
+{
+    PayloadStream in(request.payload);
+    QString path;
+    in >> path;
+    if (!in.ok())
+        return Answer::failure(PortlexError::BadRequest);
+    VolumePathResolver::Target target;
+    const VolumePathResolver::Status status = m_state.resolver().resolveEntry(path, target);
+    if (status != VolumePathResolver::Status::Ok)
+        return Answer::failure(codeFor(status));
+    const QFileInfo entry(target.localPath);
+    if (!entry.exists() && !entry.isSymLink())
+        return Answer::failure(PortlexError::NotFound);
+    // removeRecursively never follows links: a link inside is removed, not what it names.
+    const bool removed = isDirectory(target.localPath) ? QDir(target.localPath).removeRecursively()
+                                                       : QFile::remove(target.localPath);
+    m_state.filesChanged();
+    return removed ? Answer() : Answer::failure(PortlexError::IoError);
+}
