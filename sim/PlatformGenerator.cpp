@@ -33,7 +33,7 @@ QString fileBase(int index)
 
 QString folderOf(int index)
 {
-    // Four depths in turn, from the output folder itself down to three levels.
+    // Four depths in turn, one to four folders below the output folder.
     const int group = index / FilesPerFolder;
     const QString name = QStringLiteral("group%1").arg(group, 4, 10, QLatin1Char('0'));
     switch (group % 4) {
