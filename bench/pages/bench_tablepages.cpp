@@ -1,0 +1,234 @@
+// Fills the module list and the class id list of a device window from a generated image
+// (10,000 modules and 20,000 classes unless told otherwise) served by a real simulator, and
+// prints for each page: the time from its start to "Ready", the longest gap of a 5 ms
+// heartbeat on the GUI thread during the fill, the time of three-character searches over
+// the full table, and the process's peak memory.
+//
+// bench_tablepages [--modules N] [--classes N]
+
+#include "ClassListView.h"
+#include "ClassListViewThread.h"
+#include "DeviceWindow.h"
+#include "ModuleListView.h"
+#include "Portlex.h"
+
+#include <QApplication>
+#include <QCommandLineParser>
+#include <QElapsedTimer>
+#include <QEventLoop>
+#include <QProcess>
+#include <QTemporaryDir>
+#include <QTextStream>
+#include <QThread>
+#include <QTimer>
+
+#include <sys/resource.h>
+#include <time.h>
+
+#include <algorithm>
+#include <cstdio>
+
+namespace {
+
+const QString DeviceId = QStringLiteral("bench");
+
+QTextStream& out()
+{
+    static QTextStream stream(stdout);
+    return stream;
+}
+
+long peakMemoryMb()
+{
+    rusage usage {};
+    getrusage(RUSAGE_SELF, &usage);
+    return usage.ru_maxrss / 1024; // kB on Linux
+}
+
+// CPU time of the calling thread: on a busy machine it tells our own work from the time
+// the scheduler gave to other processes.
+qint64 threadCpuMs()
+{
+    timespec now {};
+    clock_gettime(CLOCK_THREAD_CPUTIME_ID, &now);
+    return qint64(now.tv_sec) * 1000 + now.tv_nsec / 1000000;
+}
+
+QString simulator()
+{
+    return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim");
+}
+
+bool generateImage(const QString& image, int modules, int classes)
+{
+    const int result = QProcess::execute(simulator(), {QStringLiteral("generate"), image, QStringLiteral("--modules"),
+                                                       QString::number(modules), QStringLiteral("--classes"),
+                                                       QString::number(classes), QStringLiteral("--files"),
+                                                       QStringLiteral("0"), QStringLiteral("--processes"),
+                                                       QStringLiteral("0")});
+    return result == 0;
+}
+
+QSharedPointer<_ZantDevice> connectDevice()
+{
+    QElapsedTimer waited;
+    waited.start();
+    while (waited.elapsed() < 120000) {
+        QList<QPair<QString, QString>> devices;
+        Portlex::GetDevices(devices);
+        const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(DeviceId);
+        if (device)
+            return Portlex::ConnectDevice(device, QString(), QString()) ? device : nullptr;
+        QThread::msleep(100);
+    }
+    return nullptr;
+}
+
+struct Fill
+{
+    qint64 longestGapMs = 0;
+    qint64 gapCpuMs = 0;  // GUI thread CPU time within the longest gap
+    qint64 gapEndMs = 0;  // when the longest gap ended, from the start of the fill
+    int gapEndRows = 0;   // rows in the table then
+};
+
+// Runs the event loop until page is complete, with a 5 ms heartbeat on the GUI thread,
+// and tells where its longest gap was.
+Fill fillWithHeartbeat(GatewayComponentWidget* page, const QTableWidget* table)
+{
+    Fill fill;
+    QElapsedTimer sinceStart;
+    QElapsedTimer sinceBeat;
+    qint64 cpuAtBeat = threadCpuMs();
+    const auto beat = [&] {
+        const qint64 gap = sinceBeat.restart();
+        const qint64 cpu = threadCpuMs();
+        if (gap > fill.longestGapMs) {
+            fill.longestGapMs = gap;
+            fill.gapCpuMs = cpu - cpuAtBeat;
+            fill.gapEndMs = sinceStart.elapsed();
+            fill.gapEndRows = table->rowCount();
+        }
+        cpuAtBeat = cpu;
+    };
+    QTimer heartbeat;
+    heartbeat.setTimerType(Qt::PreciseTimer);
+    heartbeat.setInterval(5);
+    QObject::connect(&heartbeat, &QTimer::timeout, beat);
+    QEventLoop loop;
+    QObject::connect(page, &GatewayComponentWidget::stateChanged, &loop, [&](GatewayComponentWidget::ComponentState state) {
+        if (state == GatewayComponentWidget::Complete || state == GatewayComponentWidget::Failed)
+            loop.quit();
+    });
+    sinceStart.start();
+    sinceBeat.start();
+    heartbeat.start();
+    if (page->state() != GatewayComponentWidget::Complete)
+        loop.exec();
+    beat();
+    return fill;
+}
+
+int shownRows(const QTableWidget* table)
+{
+    int shown = 0;
+    for (int row = 0; row < table->rowCount(); ++row)
+        shown += table->isRowHidden(row) ? 0 : 1;
+    return shown;
+}
+
+// A search as the user sees it: the call and the repaint that follows.
+void timeSearch(GatewayComponentWidget* page, QTableWidget* table, const QString& text)
+{
+    QElapsedTimer timer;
+    const qint64 cpuBefore = threadCpuMs();
+    timer.start();
+    page->search(text);
+    QCoreApplication::processEvents();
+    const qint64 ms = timer.elapsed();
+    out() << QStringLiteral("  search \"%1\": %2 ms (%3 ms CPU), %4 rows shown (target < 150 ms)\n")
+                 .arg(text).arg(ms).arg(threadCpuMs() - cpuBefore).arg(shownRows(table));
+}
+
+void report(const QString& name, GatewayComponentWidget* page, QTableWidget* table, qint64 readyMs, qint64 targetMs,
+            const Fill& fill, const QStringList& searches)
+{
+    out() << name << QStringLiteral(": %1 rows, status \"%2\"\n").arg(table->rowCount()).arg(page->status());
+    out() << QStringLiteral("  ready after %1 ms (target <= %2 ms)\n").arg(readyMs).arg(targetMs);
+    out() << QStringLiteral("  longest GUI gap during the fill: %1 ms (%2 ms CPU; target < 50 ms), ending %3 ms into the fill with %4 rows\n")
+                 .arg(fill.longestGapMs).arg(fill.gapCpuMs).arg(fill.gapEndMs).arg(fill.gapEndRows);
+    for (const QString& text : searches)
+        timeSearch(page, table, text);
+    timeSearch(page, table, QStringLiteral("ab"));
+    out() << QStringLiteral("  peak memory so far: %1 MB\n").arg(peakMemoryMb());
+    out().flush();
+}
+
+} // namespace
+
+int main(int argc, char** argv)
+{
+    if (qEnvironmentVariableIsEmpty("QT_QPA_PLATFORM"))
+        qputenv("QT_QPA_PLATFORM", "offscreen");
+    // The windows keep settings; these go to the work folder, not to the user's.
+    QTemporaryDir work;
+    qputenv("XDG_CONFIG_HOME", QFile::encodeName(work.filePath(QStringLiteral("config"))));
+    QApplication app(argc, argv);
+    QCommandLineParser options;
+    options.addHelpOption();
+    options.addOption({QStringLiteral("modules"), QStringLiteral("modules of the image"), QStringLiteral("N"), QStringLiteral("10000")});
+    options.addOption({QStringLiteral("classes"), QStringLiteral("classes of the image"), QStringLiteral("N"), QStringLiteral("20000")});
+    options.process(app);
+    const int modules = options.value(QStringLiteral("modules")).toInt();
+    const int classes = options.value(QStringLiteral("classes")).toInt();
+
+    const QString image = work.filePath(QStringLiteral("image"));
+    const QString sockets = work.filePath(QStringLiteral("sockets"));
+    if (!work.isValid() || !generateImage(image, modules, classes)) {
+        std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulator()));
+        return 1;
+    }
+    qputenv("ZANTRO_SIM_DIR", QFile::encodeName(sockets));
+    QProcess server;
+    server.start(simulator(), {QStringLiteral("--image"), image, QStringLiteral("--id"), DeviceId,
+                               QStringLiteral("--socket-dir"), sockets});
+    Portlex::Initialize();
+    const QSharedPointer<_ZantDevice> device = connectDevice();
+    if (!device) {
+        std::fprintf(stderr, "the simulator did not answer: %s\n", qPrintable(QString::fromLocal8Bit(server.readAll())));
+        return 1;
+    }
+    out() << QStringLiteral("image: %1 modules, %2 classes; peak memory before the pages: %3 MB\n")
+                 .arg(modules).arg(device->cache.classes.size()).arg(peakMemoryMb());
+
+    {
+        DeviceWindow window;
+        window.setAttribute(Qt::WA_DeleteOnClose, false);
+        window.setDevice(DeviceId);
+        window.show();
+        QElapsedTimer sinceStart;
+        sinceStart.start();
+        window.action_Modules->trigger();
+        const Fill fill = fillWithHeartbeat(window._moduleListView, window._moduleListView->_moduleTable);
+        report(QStringLiteral("module list"), window._moduleListView, window._moduleListView->_moduleTable,
+               sinceStart.elapsed(), 3000, fill, {QStringLiteral("777"), QStringLiteral("gen")});
+    }
+    {
+        DeviceWindow window;
+        window.setAttribute(Qt::WA_DeleteOnClose, false);
+        QElapsedTimer sinceStart;
+        sinceStart.start();
+        window.setDevice(DeviceId);
+        window.show();
+        window.action_Class_IDs->trigger();
+        const Fill fill = fillWithHeartbeat(window._classListView, window._classListView->_classIDTable);
+        const qint64 pacing = qint64(device->cache.classes.size()) * qint64(ClassListViewThread::StepMs);
+        report(QStringLiteral("class id list"), window._classListView, window._classListView->_classIDTable,
+               sinceStart.elapsed(), pacing * 6 / 5, fill, {QStringLiteral("777"), QStringLiteral("not")});
+    }
+
+    Portlex::Destroy();
+    server.terminate();
+    server.waitForFinished();
+    return 0;
+}

@@ -1,0 +1,32 @@
+#include "CITableWidgetItem.h"
+
+namespace {
+
+QString sortKey(const QTableWidgetItem& item)
+{
+    return item.data(Qt::DisplayRole).toString().toCaseFolded();
+}
+
+} // namespace
+
+CITableWidgetItem::CITableWidgetItem(const QString& text, int type)
+    : QTableWidgetItem(text, type)
+    , m_sortKey(text.toCaseFolded())
+{
+}
+
+void CITableWidgetItem::setData(int role, const QVariant& value)
+{
+    QTableWidgetItem::setData(role, value);
+    if (role == Qt::DisplayRole || role == Qt::EditRole)
+        m_sortKey = sortKey(*this);
+}
+
+bool CITableWidgetItem::operator<(const QTableWidgetItem& other) const
+{
+    if (type() != other.type())
+        return type() < other.type();
+    if (const auto* ci = dynamic_cast<const CITableWidgetItem*>(&other))
+        return m_sortKey < ci->m_sortKey;
+    return m_sortKey < sortKey(other);
+}

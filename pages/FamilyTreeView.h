@@ -1,0 +1,56 @@
+#pragma once
+
+#include "GatewayComponentWidget.h"
+#include "IdRecord.h"
+#include "PageFeed.h"
+#include "PageWorker.h"
+#include "TickPacer.h"
+#include "ui_FamilyTreeView.h"
+
+#include <QSharedPointer>
+
+struct DeviceCache;
+
+// The family tree page: the device's available classes grouped by family, then sub-family.
+// A worker queues the classes from the device's record; the tick inserts one per turn.
+class FamilyTreeView : public GatewayComponentWidget, public Ui::FamilyTreeViewClass
+{
+    Q_OBJECT
+
+public:
+    static constexpr int FirstTickMs = 500;
+    static constexpr int IdleStartMs = 0;
+    static constexpr int IdleCapMs = 500;
+    static constexpr int BusyMs = 1;
+
+    explicit FamilyTreeView(QWidget* parent = nullptr);
+
+    // Starts the worker on record's classes (the record stays the device's); null, or a
+    // second call, starts nothing.
+    void setDeviceRecord(DeviceCache* record);
+
+    const TickPacer& pacer() const;
+
+public slots:
+    QString componentName() override;
+    void startComponent(const QString& deviceId) override;
+    bool canSearch() override;
+    bool search(const QString& text) override;
+    void raisePriority() override;
+    void lowerPriority() override;
+    bool isComplete() override;
+    QString xmlReport() override;
+
+    void onTimeElapse();
+
+private:
+    void insertClass(const IdRecord& record);
+    int familyPosition(const QTreeWidgetItem* family) const;
+    void finish();
+
+    DeviceCache* m_record = nullptr;
+    QSharedPointer<PageFeed<IdRecord>> m_pending = QSharedPointer<PageFeed<IdRecord>>::create();
+    TickPacer m_pacer{IdleStartMs, IdleCapMs};
+    QString m_report;
+    PageWorker m_worker;
+};

@@ -1,0 +1,157 @@
+#include "LevelViewWidget.h"
+
+#include "CITreeWidgetItem.h"
+#include "DeviceCache.h"
+#include "FamilyGrouping.h"
+#include "LevelDefinition.h"
+#include "LevelFiles.h"
+#include "NameLibrary.h"
+#include "XmlReport.h"
+
+#include <QFileInfo>
+
+namespace {
+
+enum Column
+{
+    FamilyColumn = FamilyGrouping::FamilyColumn,
+    SubFamilyColumn = FamilyGrouping::SubFamilyColumn,
+    NameColumn,
+    IdColumn,
+    ResultColumn
+};
+
+} // namespace
+
+LevelViewWidget::LevelViewWidget(QWidget* parent)
+    : GatewayComponentWidget(parent)
+{
+    // Nothing chosen yet is a complete page.
+    setStatus(readyStatus());
+    setState(Complete);
+    initializeLibrary();
+    setupUi(this);
+    connect(_levelDocuments, &QComboBox::currentIndexChanged, this, &LevelViewWidget::onCurrentLevelChanged);
+}
+
+void LevelViewWidget::setDeviceRecord(DeviceCache* record)
+{
+    m_record = record;
+    if (!record)
+        return;
+    QStringList files;
+    listLevelFiles(files);
+    for (const QString& file : std::as_const(files)) {
+        const QFileInfo info(file);
+        _levelDocuments->addItem(info.baseName(), info.absoluteFilePath());
+    }
+}
+
+QString LevelViewWidget::componentName()
+{
+    return QStringLiteral("LevelView");
+}
+
+void LevelViewWidget::startComponent(const QString&)
+{
+}
+
+bool LevelViewWidget::canSearch()
+{
+    return state() == Complete;
+}
+
+bool LevelViewWidget::search(const QString& text)
+{
+    return applyTreeSearch(text, _level1Tree);
+}
+
+void LevelViewWidget::raisePriority()
+{
+}
+
+void LevelViewWidget::lowerPriority()
+{
+}
+
+bool LevelViewWidget::isComplete()
+{
+    return statusIsReady();
+}
+
+void LevelViewWidget::onCurrentLevelChanged(int index)
+{
+    setStatus(QStringLiteral("Processing"));
+    setState(Processing);
+    // The prompt, or a choice before the record arrived, leaves the page processing.
+    if (!m_record)
+        return;
+    const QString path = _levelDocuments->itemData(index).toString();
+    if (path.isEmpty())
+        return;
+
+    LevelDefinition level;
+    level.setIdMap(&m_record->classes);
+    if (!level.load(path)) {
+        setStatus(QStringLiteral("Level file not found"));
+        setState(Failed);
+        return;
+    }
+    QList<IdRecord> entries;
+    level.copyRecords(entries);
+
+    _level1Tree->clear();
+    for (const IdRecord& entry : std::as_const(entries))
+        insertEntry(entry);
+    _level1Tree->setUpdatesEnabled(false);
+    _level1Tree->sortByColumn(FamilyColumn, Qt::AscendingOrder);
+    _level1Tree->expandAll();
+    for (int column = FamilyColumn; column <= IdColumn; ++column)
+        _level1Tree->resizeColumnToContents(column);
+    _level1Tree->setUpdatesEnabled(true);
+    setStatus(readyStatus());
+    setState(Complete);
+}
+
+void LevelViewWidget::insertEntry(const IdRecord& entry)
+{
+    QTreeWidgetItem* subFamily = nullptr;
+    QTreeWidgetItem* family = FamilyGrouping::findFamily(_level1Tree, entry.family);
+    if (!family) {
+        family = new CITreeWidgetItem;
+        family->setText(FamilyColumn, entry.family);
+        subFamily = FamilyGrouping::addSubFamily(family, entry.subFamily);
+        _level1Tree->addTopLevelItem(family);
+    } else {
+        subFamily = FamilyGrouping::findSubFamily(family, entry.subFamily);
+        if (!subFamily)
+            subFamily = FamilyGrouping::addSubFamily(family, entry.subFamily);
+    }
+
+    auto* item = new CITreeWidgetItem;
+    item->setText(NameColumn, entry.name);
+    item->setText(IdColumn, entry.id);
+    if (entry.available) {
+        item->setText(ResultColumn, QStringLiteral("Found"));
+        item->setForeground(ResultColumn, QBrush(Qt::green));
+    } else {
+        item->setText(ResultColumn, QStringLiteral("Not Found"));
+        item->setForeground(ResultColumn, QBrush(Qt::red));
+    }
+    subFamily->addChild(item);
+}
+
+QString LevelViewWidget::xmlReport()
+{
+    if (!m_report.isEmpty())
+        return m_report;
+    XmlReport report(QStringLiteral("levelreport"));
+    QXmlStreamWriter& xml = report.writer();
+    xml.writeStartElement(QStringLiteral("device"));
+    FamilyGrouping::writeFamilies(xml, _level1Tree,
+                                  {{QStringLiteral("name"), NameColumn},
+                                   {QStringLiteral("classid"), IdColumn},
+                                   {QStringLiteral("available"), ResultColumn}});
+    m_report = report.text();
+    return m_report;
+}
