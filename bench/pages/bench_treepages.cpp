@@ -13,6 +13,7 @@
 #include "FamilyTreeViewThread.h"
 #include "IdFormat.h"
 #include "LevelViewWidget.h"
+#include "PageBenchDevice.h"
 #include "Portlex.h"
 
 #include <QApplication>
@@ -28,57 +29,19 @@
 #include <QTreeWidgetItemIterator>
 #include <QXmlStreamWriter>
 
-#include <sys/resource.h>
 
 #include <algorithm>
 #include <cstdio>
 #include <functional>
 
-namespace {
+using namespace PageBenchDevice;
 
-const QString DeviceId = QStringLiteral("bench");
+namespace {
 
 QTextStream& out()
 {
     static QTextStream stream(stdout);
     return stream;
-}
-
-long peakMemoryMb()
-{
-    rusage usage {};
-    getrusage(RUSAGE_SELF, &usage);
-    return usage.ru_maxrss / 1024; // kB on Linux
-}
-
-QString simulator()
-{
-    return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim");
-}
-
-bool generateImage(const QString& image, int modules, int classes)
-{
-    const int result = QProcess::execute(simulator(), {QStringLiteral("generate"), image, QStringLiteral("--modules"),
-                                                       QString::number(modules), QStringLiteral("--classes"),
-                                                       QString::number(classes), QStringLiteral("--files"),
-                                                       QStringLiteral("0"), QStringLiteral("--processes"),
-                                                       QStringLiteral("0")});
-    return result == 0;
-}
-
-QSharedPointer<_ZantDevice> connectDevice()
-{
-    QElapsedTimer waited;
-    waited.start();
-    while (waited.elapsed() < 120000) {
-        QList<QPair<QString, QString>> devices;
-        Portlex::GetDevices(devices);
-        const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(DeviceId);
-        if (device)
-            return Portlex::ConnectDevice(device, QString(), QString()) ? device : nullptr;
-        QThread::msleep(100);
-    }
-    return nullptr;
 }
 
 // A level file that asks for every class of the device and for as many it lacks.
@@ -226,12 +189,12 @@ int main(int argc, char** argv)
     const QString image = work.filePath(QStringLiteral("image"));
     const QString sockets = work.filePath(QStringLiteral("sockets"));
     if (!work.isValid() || !generateImage(image, modules, classes)) {
-        std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulator()));
+        std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulatorPath()));
         return 1;
     }
     qputenv("ZANTRO_SIM_DIR", QFile::encodeName(sockets));
     QProcess server;
-    server.start(simulator(), {QStringLiteral("--image"), image, QStringLiteral("--id"), DeviceId,
+    server.start(simulatorPath(), {QStringLiteral("--image"), image, QStringLiteral("--id"), DeviceId,
                                QStringLiteral("--socket-dir"), sockets});
     Portlex::Initialize();
     const QSharedPointer<_ZantDevice> device = connectDevice();

@@ -1,0 +1,51 @@
+#include "PageBenchDevice.h"
+
+#include "Portlex.h"
+
+#include <QCoreApplication>
+#include <QElapsedTimer>
+#include <QProcess>
+#include <QThread>
+
+#include <sys/resource.h>
+
+namespace PageBenchDevice {
+
+QString simulatorPath()
+{
+    return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim");
+}
+
+bool generateImage(const QString& image, int modules, int classes)
+{
+    const int result = QProcess::execute(simulatorPath(), {QStringLiteral("generate"), image, QStringLiteral("--modules"),
+                                                           QString::number(modules), QStringLiteral("--classes"),
+                                                           QString::number(classes), QStringLiteral("--files"),
+                                                           QStringLiteral("0"), QStringLiteral("--processes"),
+                                                           QStringLiteral("0")});
+    return result == 0;
+}
+
+QSharedPointer<_ZantDevice> connectDevice()
+{
+    QElapsedTimer waited;
+    waited.start();
+    while (waited.elapsed() < 120000) {
+        QList<QPair<QString, QString>> devices;
+        Portlex::GetDevices(devices);
+        const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(DeviceId);
+        if (device)
+            return Portlex::ConnectDevice(device, QString(), QString()) ? device : nullptr;
+        QThread::msleep(100);
+    }
+    return nullptr;
+}
+
+long peakMemoryMb()
+{
+    rusage usage {};
+    getrusage(RUSAGE_SELF, &usage);
+    return usage.ru_maxrss / 1024; // kB on Linux
+}
+
+} // namespace PageBenchDevice
