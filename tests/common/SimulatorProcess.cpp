@@ -1,6 +1,7 @@
 #include "SimulatorProcess.h"
 
 #include "DeviceConnection.h"
+#include "Portlex.h"
 
 #include <QCoreApplication>
 #include <QDeadlineTimer>
@@ -48,6 +49,7 @@ bool SimulatorProcess::start(const QString& image, const QString& id, const QStr
     if (use == Image::FreshCopy)
         arguments << QStringLiteral("--reset");
     arguments += extraArguments;
+    removeServedCopy();
     m_process.start(executable(), arguments);
     if (!m_process.waitForStarted()) {
         m_error = m_process.errorString();
@@ -56,8 +58,19 @@ bool SimulatorProcess::start(const QString& image, const QString& id, const QStr
     const QDeadlineTimer deadline(StartTimeoutMs);
     while (!deadline.hasExpired()) {
         m_socketPath = findSocket(id);
-        if (!m_socketPath.isEmpty())
+        if (!m_socketPath.isEmpty()) {
+            if (use == Image::FreshCopy) {
+                // "zantro-sim: serving COPY on SOCKET": the copy to remove should the process be killed.
+                QByteArray said = m_process.readAll();
+                while (!said.contains('\n') && m_process.waitForReadyRead(1000))
+                    said += m_process.readAll();
+                const QString line = QString::fromLocal8Bit(said);
+                const int from = line.indexOf(QLatin1String("serving ")), to = line.indexOf(QLatin1String(" on "));
+                if (from >= 0 && to > from)
+                    m_servedCopy = line.mid(from + 8, to - from - 8);
+            }
             return true;
+        }
         // Doubles as the pause between probes and notices an early exit.
         if (m_process.waitForFinished(20) || m_process.state() == QProcess::NotRunning) {
             m_error = QStringLiteral("zantro-sim ended: ") + QString::fromLocal8Bit(m_process.readAll());
@@ -81,22 +94,52 @@ QString SimulatorProcess::findSocket(const QString& id) const
     return QString();
 }
 
+QSharedPointer<_ZantDevice> SimulatorProcess::connectDevice(const QString& image, const QString& id,
+                                                          const QStringList& extraArguments, Image use)
+{
+    if (!start(image, id, extraArguments, use)) {
+        qWarning("%s", qPrintable(m_error));
+        return {};
+    }
+    QList<QPair<QString, QString>> devices;
+    Portlex::GetDevices(devices);
+    QSharedPointer<_ZantDevice> device = Portlex::GetDevice(id);
+    if (device && Portlex::ConnectDevice(device, QString(), QString()))
+        return device;
+    qWarning("connecting %s failed: %s", qPrintable(id), qPrintable(Portlex::LastStatus()));
+    return {};
+}
+
 bool SimulatorProcess::stop()
 {
     if (!isRunning())
         return true;
     sendSignal(SIGTERM);
-    if (m_process.waitForFinished(10000))
-        return m_process.exitStatus() == QProcess::NormalExit;
-    m_process.kill();
-    m_process.waitForFinished();
-    return false;
+    bool clean = false;
+    if (m_process.waitForFinished(10000)) {
+        clean = m_process.exitStatus() == QProcess::NormalExit;
+    } else {
+        m_process.kill();
+        m_process.waitForFinished();
+    }
+    removeServedCopy();
+    return clean;
 }
 
 void SimulatorProcess::kill()
 {
     sendSignal(SIGKILL);
     m_process.waitForFinished();
+    removeServedCopy();
+}
+
+// A clean exit removes the copy itself; a killed simulator leaves it behind.
+void SimulatorProcess::removeServedCopy()
+{
+    if (!m_servedCopy.isEmpty() && !isRunning())
+        QDir(m_servedCopy).removeRecursively();
+    if (!isRunning())
+        m_servedCopy.clear();
 }
 
 void SimulatorProcess::pause()
