@@ -1,6 +1,7 @@
 #include "LevelDefinition.h"
 
 #include "IdFormat.h"
+#include "XmlReadPolicy.h"
 
 #include <QDomDocument>
 #include <QFile>
@@ -8,16 +9,22 @@
 bool LevelDefinition::load(const QString& path)
 {
     QFile file(path);
-    if (!file.open(QIODevice::ReadOnly))
+    if (!file.open(QIODevice::ReadOnly)) {
+        m_error = QStringLiteral("cannot open %1: %2").arg(path, file.errorString());
         return false;
+    }
     return load(&file);
 }
 
 bool LevelDefinition::load(QIODevice* device)
 {
+    XmlReadPolicy policy(XmlReadPolicy::DatabaseFileBytes);
     QDomDocument document;
-    if (!document.setContent(device))
+    if (!policy.read(device, document)) {
+        m_error = policy.errorString();
         return false;
+    }
+    m_error.clear();
 
     const QString idElement = QStringLiteral("Id");
     const QDomElement root = document.documentElement();

@@ -3,6 +3,7 @@
 #include "IdRecord.h"
 
 #include <QList>
+#include <QString>
 
 class QIODevice;
 
@@ -15,10 +16,12 @@ public:
     // Not owned; may be null. Must outlive load().
     void setIdMap(const IdRecordMap* map) { m_idMap = map; }
 
-    // Appends the file's classes. False, with the records unchanged, when the file cannot
-    // be opened or parsed; true otherwise, also when it lists no class.
+    // Appends the file's classes. False, with the records unchanged and the reason in
+    // errorString(), when the file cannot be opened, breaks XmlReadPolicy's limits or does
+    // not parse; true otherwise, also when it lists no class.
     bool load(const QString& path);
     bool load(QIODevice* device); // open for reading
+    QString errorString() const { return m_error; }
 
     void copyRecords(QList<IdRecord>& list) const { list = m_records; }
     const QList<IdRecord>& records() const { return m_records; }
@@ -26,4 +29,5 @@ public:
 private:
     QList<IdRecord> m_records;
     const IdRecordMap* m_idMap = nullptr;
+    QString m_error;
 };

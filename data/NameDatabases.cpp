@@ -1,6 +1,7 @@
 #include "NameDatabases.h"
 
 #include "IdFormat.h"
+#include "XmlReadPolicy.h"
 
 #include <QDir>
 #include <QDomDocument>
@@ -67,11 +68,16 @@ void NameDatabases::priviledgesInRange(quint32 low, quint32 high, QList<Priviled
     }
 }
 
-bool NameDatabases::readEntries(QIODevice* device, const QString& elementName, QList<IdRecord>& entries)
+bool NameDatabases::readEntries(QIODevice* device, const QString& elementName, QList<IdRecord>& entries,
+                                QString* error)
 {
+    XmlReadPolicy policy(XmlReadPolicy::DatabaseFileBytes);
     QDomDocument document;
-    if (!document.setContent(device))
+    if (!policy.read(device, document)) {
+        if (error)
+            *error = policy.errorString();
         return false;
+    }
 
     const QDomElement root = document.documentElement();
     for (QDomElement e = root.firstChildElement(elementName); !e.isNull(); e = e.nextSiblingElement(elementName)) {

@@ -16,7 +16,7 @@ class NameDatabases
 {
 public:
     // Reads the three files of the folder into the maps, each entry replacing an earlier one
-    // with the same id. A missing or malformed file leaves its database as it was.
+    // with the same id. A missing, malformed or refused file leaves its database as it was.
     void load(const QString& directory);
 
     // load() on the first call only; later calls do nothing, whatever the folder.
@@ -34,8 +34,10 @@ public:
 
     // The entries of one database document read from an open device: direct children of
     // the root named elementName that have both an id and a name, in document order (only
-    // the first four fields filled). Returns false, entries untouched, if it does not parse.
-    static bool readEntries(QIODevice* device, const QString& elementName, QList<IdRecord>& entries);
+    // the first four fields filled). Returns false, entries untouched and the reason in
+    // error when given, if it breaks XmlReadPolicy's limits or does not parse.
+    static bool readEntries(QIODevice* device, const QString& elementName, QList<IdRecord>& entries,
+                            QString* error = nullptr);
 
 private:
     static void lookupIn(const IdRecordMap& map, const QString& idText, QString& name, QString& family, QString& subFamily);

@@ -1,9 +1,9 @@
 #include "DeviceProfileParser.h"
 
 #include "IdFormat.h"
+#include "XmlReadPolicy.h"
 
 #include <QDomDocument>
-#include <QFile>
 #include <QRegularExpression>
 #include <QSet>
 
@@ -44,22 +44,28 @@ bool DeviceProfileParser::isValidDeviceId(const QString& id)
 
 bool DeviceProfileParser::parseFile(const QString& path, DeviceProfile& profile)
 {
-    QFile file(path);
-    if (!file.open(QIODevice::ReadOnly))
-        return fail(QStringLiteral("cannot open %1: %2").arg(path, file.errorString()));
-    return parse(file.readAll(), profile);
+    m_error.clear();
+    profile = DeviceProfile();
+    XmlReadPolicy policy(XmlReadPolicy::ProfileFileBytes);
+    QDomDocument document;
+    if (!policy.readFile(path, document))
+        return fail(policy.errorString());
+    return readDocument(document, profile);
 }
 
 bool DeviceProfileParser::parse(const QByteArray& xml, DeviceProfile& profile)
 {
     m_error.clear();
     profile = DeviceProfile();
-
+    XmlReadPolicy policy(XmlReadPolicy::ProfileFileBytes);
     QDomDocument document;
-    QString message;
-    int line = 0;
-    if (!document.setContent(xml, &message, &line))
-        return fail(QStringLiteral("device.xml line %1: %2").arg(line).arg(message));
+    if (!policy.parse(xml, QStringLiteral("device.xml"), document))
+        return fail(policy.errorString());
+    return readDocument(document, profile);
+}
+
+bool DeviceProfileParser::readDocument(const QDomDocument& document, DeviceProfile& profile)
+{
     const QDomElement root = document.documentElement();
     if (root.tagName() != QLatin1String("device"))
         return fail(QStringLiteral("the root element must be <device>"));

@@ -5,14 +5,17 @@
 #include <QByteArray>
 #include <QString>
 
+class QDomDocument;
 class QDomElement;
 
 // Reads device.xml. The file comes with an image that may have been written by anyone, so
-// every value is checked: a profile that parses is safe to serve.
+// it is read under XmlReadPolicy's limits and every value is checked: a profile that
+// parses is safe to serve.
 class DeviceProfileParser
 {
 public:
     bool parse(const QByteArray& xml, DeviceProfile& profile);
+    // Messages about the file as a whole (opening it, a limit, malformed XML) name the path.
     bool parseFile(const QString& path, DeviceProfile& profile);
     QString errorString() const { return m_error; }
 
@@ -22,6 +25,7 @@ public:
 
 private:
     bool fail(const QString& message);
+    bool readDocument(const QDomDocument& document, DeviceProfile& profile);
     bool readIdentity(const QDomElement& e, DeviceProfile& profile);
     void readFacts(const QDomElement& e, DeviceData& data);
     bool readPlatform(const QDomElement& e, DeviceProfile& profile);
