@@ -1,11 +1,13 @@
 #include "Delvix.h"
 
 #include "AboutDialog.h"
+#include "DeviceDirectory.h"
 #include "DeviceWindow.h"
 #include "Portlex.h"
 #include "SplashDialog.h"
 
 #include <QApplication>
+#include <QGuiApplication>
 #include <QMenu>
 #include <QSettings>
 #include <QSystemTrayIcon>
@@ -15,6 +17,11 @@
 namespace {
 
 const char* const Version = "0.5.1.0";
+
+// How often the device list is probed while nobody asks for it.
+const int DeviceProbeIntervalMs = 1000;
+// Connects wait on devices, not on the processor: a few hung ones must not hold up the next.
+const int MaxConnectsUnderWay = 8;
 
 // What each menu action carries as data; the menu logic keys on it.
 enum MenuRole : uint
@@ -36,6 +43,10 @@ QString notice()
 Delvix::Delvix(QWidget* parent)
     : QDialog(parent)
 {
+    // A pool thread keeps its connections to the devices while it lives: let it end with its connect.
+    m_connects.setExpiryTimeout(0);
+    m_connects.setMaxThreadCount(MaxConnectsUnderWay);
+
     auto* splash = new SplashDialog(":/Resources/splash.png", notice(), Version);
     splash->show();
     splash->startCloseTimer(3500);
@@ -43,6 +54,8 @@ Delvix::Delvix(QWidget* parent)
     setWindowFlags(windowFlags() & ~Qt::WindowContextHelpButtonHint);
     setupUi(this);
     _actionNoDevices->setEnabled(false);
+    m_directory = new DeviceDirectory(DeviceProbeIntervalMs, this);
+    connect(m_directory, &DeviceDirectory::changed, this, [this] { showDevices(); });
     createTrayIcon();
     m_trayIcon->show();
     hide();
@@ -59,6 +72,15 @@ Delvix::Delvix(QWidget* parent)
                                 QSystemTrayIcon::Information, 10000);
         settings.setValue("seen", seen + 1);
     }
+}
+
+Delvix::~Delvix()
+{
+    m_trayIcon->hide();
+    m_connects.waitForDone();
+    // Connects that ended while this waited never report back: give back their busy cursors here.
+    for (int i = 0; i < m_connecting.size(); ++i)
+        QGuiApplication::restoreOverrideCursor();
 }
 
 void Delvix::createTrayIcon()
@@ -81,6 +103,12 @@ void Delvix::createTrayIcon()
 
 void Delvix::onAboutToShow()
 {
+    showDevices();
+    m_directory->refresh();
+}
+
+void Delvix::showDevices()
+{
     bool inSection = false;
     QAction* sectionEnd = nullptr;
     for (QAction* action : m_trayMenu->actions()) {
@@ -97,8 +125,8 @@ void Delvix::onAboutToShow()
         }
     }
 
-    QList<QPair<QString, QString>> devices;
-    if (Portlex::GetDevices(devices) == 0) {
+    const QList<QPair<QString, QString>> devices = m_directory->devices();
+    if (devices.isEmpty()) {
         m_trayMenu->insertAction(sectionEnd, _actionNoDevices);
         return;
     }
@@ -144,13 +172,42 @@ void Delvix::connectToDevice(const QString& targetId)
     const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(targetId);
     if (!device)
         return;
-    if (!device->Connected() && !Portlex::ConnectDevice(device, QString(), QString())) {
-        m_trayIcon->showMessage(tr("Connect Failed"),
-                                "Failure Code: (" + QString::number(Portlex::LastError()) + ") "
-                                    + Portlex::LastStatus(),
-                                QSystemTrayIcon::Information, 2500);
+    if (device->Connected()) {
+        openDeviceWindow(targetId);
         return;
     }
+    // One connect per device at a time: each choice made meanwhile adds a window to open.
+    if (auto pending = m_connecting.find(targetId); pending != m_connecting.end()) {
+        ++*pending;
+        return;
+    }
+    m_connecting.insert(targetId, 1);
+    QGuiApplication::setOverrideCursor(Qt::BusyCursor);
+    m_connects.start([this, device, targetId] {
+        QString failure;
+        if (!Portlex::ConnectDevice(device, QString(), QString()))
+            failure = QString("Failure Code: (%1) ").arg(Portlex::LastError()) + Portlex::LastStatus();
+        QMetaObject::invokeMethod(this, [this, targetId, failure] { connectFinished(targetId, failure); },
+                                  Qt::QueuedConnection);
+    });
+}
+
+void Delvix::connectFinished(const QString& targetId, const QString& failure)
+{
+    QGuiApplication::restoreOverrideCursor();
+    const int windows = m_connecting.take(targetId);
+    if (m_exiting)
+        return;
+    if (!failure.isEmpty()) {
+        m_trayIcon->showMessage(tr("Connect Failed"), failure, QSystemTrayIcon::Information, 2500);
+        return;
+    }
+    for (int i = 0; i < windows; ++i)
+        openDeviceWindow(targetId);
+}
+
+void Delvix::openDeviceWindow(const QString& targetId)
+{
     auto* window = new DeviceWindow;
     window->setDevice(targetId);
     window->show();
@@ -158,6 +215,8 @@ void Delvix::connectToDevice(const QString& targetId)
 
 void Delvix::onActionExit()
 {
+    // A connect that ends from now on opens nothing.
+    m_exiting = true;
     QApplication::setQuitOnLastWindowClosed(true);
     for (QWidget* window : QApplication::topLevelWidgets())
         window->close();

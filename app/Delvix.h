@@ -3,19 +3,25 @@
 #include "ui_Delvix.h"
 
 #include <QDialog>
+#include <QHash>
+#include <QThreadPool>
 
+class DeviceDirectory;
 class QMenu;
 class QSystemTrayIcon;
 
 // The program's presence in the system tray: a hidden dialog that owns the tray icon and its
-// menu. The menu lists the gateway devices afresh at every opening; choosing one connects to
-// it and opens a device window.
+// menu. The menu lists the gateway devices as last probed in the background, rebuilt at every
+// opening and whenever the list changes; choosing one connects to it off the GUI thread and
+// opens a device window. A device that does not answer never holds up the GUI.
 class Delvix : public QDialog, public Ui::DelvixClass
 {
     Q_OBJECT
 
 public:
     explicit Delvix(QWidget* parent = nullptr);
+    // Waits for connects under way, which end within their call timeouts.
+    ~Delvix() override;
 
 private slots:
     void onTriggered(bool checked);
@@ -24,9 +30,17 @@ private slots:
 
 private:
     void createTrayIcon();
+    void showDevices();
     void connectToDevice(const QString& targetId);
+    void connectFinished(const QString& targetId, const QString& failure);
+    void openDeviceWindow(const QString& targetId);
     void showAbout();
 
     QSystemTrayIcon* m_trayIcon = nullptr;
     QMenu* m_trayMenu = nullptr;
+    DeviceDirectory* m_directory = nullptr;
+    // Target id -> windows to open once its connect under way succeeds.
+    QHash<QString, int> m_connecting;
+    bool m_exiting = false;
+    QThreadPool m_connects;
 };
