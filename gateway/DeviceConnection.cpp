@@ -3,11 +3,30 @@
 #include "PayloadStream.h"
 #include "PortlexErrors.h"
 
+#include <QFileInfo>
 #include <QLocalSocket>
 
 #include <sys/socket.h>
+#include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
+
+namespace {
+
+std::atomic<int> callTimeout { Protocol::CallTimeoutMs };
+
+} // namespace
+
+int DeviceConnection::callTimeoutMs()
+{
+    return callTimeout.load();
+}
+
+void DeviceConnection::setCallTimeoutMs(int milliseconds)
+{
+    callTimeout = milliseconds;
+}
 
 DeviceConnection::DeviceConnection(const QString& socketPath)
     : m_socketPath(socketPath)
@@ -48,16 +67,26 @@ qint32 DeviceConnection::collect(Operation operation, QByteArray* body, QDeadlin
 
 bool DeviceConnection::startHandshake()
 {
+    return connectSocket() == 0;
+}
+
+qint32 DeviceConnection::connectSocket()
+{
     m_greeted = false;
     m_decoder.clear();
     m_pending.clear();
+    const QString folder = QFileInfo(m_socketPath).absolutePath();
+    QString unsafe;
+    if (!QFileInfo::exists(folder))
+        return fail(PortlexError::Unreachable, QStringLiteral("No device listens on %1: no such folder").arg(m_socketPath));
+    if (!Protocol::checkSocketDirectory(folder, &unsafe))
+        return fail(PortlexError::Untrusted, unsafe);
     m_socket = std::make_unique<QLocalSocket>();
     m_socket->connectToServer(m_socketPath);
-    if (m_socket->state() == QLocalSocket::UnconnectedState) {
-        fail(PortlexError::Unreachable, QStringLiteral("No device listens on %1: %2").arg(m_socketPath, m_socket->errorString()));
-        return false;
-    }
-    return true;
+    if (m_socket->state() == QLocalSocket::UnconnectedState)
+        return fail(PortlexError::Unreachable,
+                    QStringLiteral("No device listens on %1: %2").arg(m_socketPath, m_socket->errorString()));
+    return 0;
 }
 
 qint32 DeviceConnection::finishHandshake(QDeadlineTimer deadline)
@@ -66,6 +95,14 @@ qint32 DeviceConnection::finishHandshake(QDeadlineTimer deadline)
         return PortlexError::Unreachable;
     if (m_socket->state() != QLocalSocket::ConnectedState && !m_socket->waitForConnected(deadline.remainingTime()))
         return fail(PortlexError::Unreachable, QStringLiteral("No device listens on %1").arg(m_socketPath));
+    // Whoever listens there learns nothing from us unless it is our own user's process.
+    ucred peer {};
+    socklen_t length = sizeof peer;
+    if (::getsockopt(int(m_socket->socketDescriptor()), SOL_SOCKET, SO_PEERCRED, &peer, &length) != 0)
+        return fail(PortlexError::Untrusted, QStringLiteral("Cannot tell who runs the device on %1").arg(m_socketPath));
+    if (peer.uid != ::geteuid())
+        return fail(PortlexError::Untrusted,
+                    QStringLiteral("The device on %1 runs as another user (uid %2)").arg(m_socketPath).arg(peer.uid));
     Protocol::widenSocketBuffers(m_socket->socketDescriptor());
 
     QByteArray hello;
@@ -92,9 +129,18 @@ qint32 DeviceConnection::finishHandshake(QDeadlineTimer deadline)
 
 qint32 DeviceConnection::open(QDeadlineTimer deadline)
 {
-    if (!startHandshake())
-        return PortlexError::Unreachable;
-    return finishHandshake(deadline);
+    const qint32 connected = connectSocket();
+    const qint32 greeted = connected != 0 ? connected : finishHandshake(deadline);
+    if (greeted != 0 || m_connectRequest.isEmpty())
+        return greeted;
+    QByteArray body;
+    const qint32 accepted = exchange(Operation::Connect, m_connectRequest, Protocol::NoFlags, &body, deadline);
+    if (accepted == 0 || !m_socket)
+        return accepted;  // done, or the exchange failed and said why
+    QString status;
+    PayloadStream in(body);
+    in >> status;
+    return fail(accepted, QStringLiteral("The device refused the connection: %1").arg(status));
 }
 
 bool DeviceConnection::usable()
@@ -126,7 +172,7 @@ qint32 DeviceConnection::exchange(Operation operation, const QByteArray& request
 qint32 DeviceConnection::send(Operation operation, const QByteArray& request, Protocol::RequestFlags flags,
                               QDeadlineTimer deadline)
 {
-    if (quint32(request.size()) > Protocol::MaxPayloadSize)
+    if (quint32(request.size()) > Protocol::MaxRequestSize)
         return fail(PortlexError::InvalidArgument, QStringLiteral("Request of %1 bytes exceeds the frame limit").arg(request.size()));
     Frame frame;
     frame.flags = quint16(flags.toInt());
@@ -142,31 +188,37 @@ qint32 DeviceConnection::send(Operation operation, const QByteArray& request, Pr
     while (m_socket->bytesToWrite() > 0) {
         if (!m_socket->waitForBytesWritten(int(deadline.remainingTime())))
             return fail(m_socket->state() == QLocalSocket::ConnectedState ? PortlexError::Timeout : PortlexError::Unreachable,
-                        QStringLiteral("The device did not take the request within %1 ms").arg(Protocol::CallTimeoutMs));
+                        QStringLiteral("The device did not take the request in time"));
     }
     return 0;
 }
 
 qint32 DeviceConnection::receive(Operation operation, QByteArray* body, QDeadlineTimer deadline)
 {
+    // The caller's time is a limit on silence: each StillWorking notice grants it afresh.
+    const qint64 patience = deadline.remainingTime();
     Frame frame;
     for (;;) {
         const FrameDecoder::Status status = m_decoder.next(&frame);
-        if (status == FrameDecoder::Status::Ready)
-            break;
+        if (status == FrameDecoder::Status::Ready) {
+            if ((frame.flags & Protocol::StillWorking) == 0)
+                break;
+            if (!answersPending(frame, operation))
+                return fail(PortlexError::ProtocolError, QStringLiteral("Notice does not match the request"));
+            deadline.setRemainingTime(patience);
+            continue;
+        }
         if (status == FrameDecoder::Status::Malformed)
             return fail(PortlexError::ProtocolError, m_decoder.errorString());
         if (m_socket->bytesAvailable() == 0 && !m_socket->waitForReadyRead(int(deadline.remainingTime()))) {
             if (m_socket->state() != QLocalSocket::ConnectedState)
                 return fail(PortlexError::Unreachable, QStringLiteral("The device closed the connection"));
-            return fail(PortlexError::Timeout, QStringLiteral("The device did not answer within %1 ms").arg(Protocol::CallTimeoutMs));
+            return fail(PortlexError::Timeout, QStringLiteral("The device gave no sign of life for %1 ms").arg(patience));
         }
         m_decoder.feed(m_socket->readAll());
     }
 
-    // A refused handshake comes in the device's own version; everything else in ours.
-    const bool versionOk = frame.version == Protocol::ProtocolVersion || operation == Operation::Hello;
-    if (!versionOk || m_pending.empty() || frame.requestId != m_pending.front() || frame.operation != quint32(operation))
+    if (!answersPending(frame, operation))
         return fail(PortlexError::ProtocolError, QStringLiteral("Answer does not match the request"));
     m_pending.pop_front();
     PayloadStream in(frame.payload);
@@ -176,6 +228,13 @@ qint32 DeviceConnection::receive(Operation operation, QByteArray* body, QDeadlin
         return fail(PortlexError::ProtocolError, QStringLiteral("Answer without a result"));
     *body = frame.payload.mid(sizeof(qint32));
     return result;
+}
+
+bool DeviceConnection::answersPending(const Frame& frame, Operation operation) const
+{
+    // A refused handshake comes in the device's own version; everything else in ours.
+    const bool versionOk = frame.version == Protocol::ProtocolVersion || operation == Operation::Hello;
+    return versionOk && !m_pending.empty() && frame.requestId == m_pending.front() && frame.operation == quint32(operation);
 }
 
 qint32 DeviceConnection::fail(qint32 code, const QString& message)

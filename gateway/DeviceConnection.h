@@ -12,17 +12,29 @@
 class QLocalSocket;
 
 // One blocking connection from the calling thread to a device's socket. Needs no event
-// loop: every wait is a blocking wait bounded by the call's deadline. Not shared between
-// threads. After any failure the connection is dropped; the next call opens a new one.
+// loop: every wait is a blocking wait bounded by the call's deadline, which a StillWorking
+// notice from the device renews for as long as the caller first allowed. Not shared
+// between threads. After any failure the connection is dropped; the next call opens a
+// new one. Connects only through a private socket folder of the user's own, and sends
+// nothing to a device process of another user (Untrusted).
 class DeviceConnection
 {
 public:
+    // How long the gateway's calls wait for a sign of life: Protocol::CallTimeoutMs, or
+    // less in tests that do not want to wait for a hung device that long.
+    static int callTimeoutMs();
+    static void setCallTimeoutMs(int milliseconds);
+
     explicit DeviceConnection(const QString& socketPath);
     ~DeviceConnection();
     DeviceConnection(const DeviceConnection&) = delete;
     DeviceConnection& operator=(const DeviceConnection&) = delete;
 
     QString socketPath() const { return m_socketPath; }
+    // The Connect request (its payload) sent right after the handshake of every connection
+    // this opens: a device serves a connection only after it accepted a Connect on it.
+    // Empty (the default): none is sent.
+    void setConnectRequest(const QByteArray& request) { m_connectRequest = request; }
 
     // Sends one request and waits for its answer. Returns the answer's result (or a client
     // error code) and stores the answer's fields after the result in body.
@@ -47,6 +59,7 @@ public:
     QString errorString() const { return m_error; }
 
 private:
+    qint32 connectSocket();
     qint32 open(QDeadlineTimer deadline);
     bool usable();
     qint32 exchange(Operation operation, const QByteArray& request, Protocol::RequestFlags flags, QByteArray* body,
@@ -54,8 +67,10 @@ private:
     qint32 send(Operation operation, const QByteArray& request, Protocol::RequestFlags flags, QDeadlineTimer deadline);
     qint32 receive(Operation operation, QByteArray* body, QDeadlineTimer deadline);
     qint32 fail(qint32 code, const QString& message);
+    bool answersPending(const Frame& frame, Operation operation) const;
 
     QString m_socketPath;
+    QByteArray m_connectRequest;
     std::unique_ptr<QLocalSocket> m_socket;
     FrameDecoder m_decoder;
     quint32 m_nextRequestId = 1;

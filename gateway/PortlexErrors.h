@@ -7,7 +7,8 @@ namespace PortlexError {
 // Raised by the client library.
 enum Client : int
 {
-    NotConnected = 1001,     // ConnectDevice has not succeeded for this device
+    NotConnected = 1001,     // ConnectDevice has not succeeded for this device (or, from a
+                             // device, this connection has sent no accepted Connect)
     Timeout = 1002,          // no complete answer within the call timeout
     Unreachable = 1003,      // no simulator listens on the device's socket
     ProtocolError = 1004,    // malformed, unexpected or oversized frame
@@ -15,6 +16,7 @@ enum Client : int
     NotImplemented = 1006,   // operation not available in this version of the library
     InvalidArgument = 1007,  // a null record was passed, or a request too large for a frame
     LocalFileError = 1008,   // the file on the PC could not be read or written
+    Untrusted = 1009,        // the socket folder or the device's process is not the user's own
 };
 
 // Answered by the device side.

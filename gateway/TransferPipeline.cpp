@@ -12,7 +12,7 @@ namespace {
 
 QDeadlineTimer chunkDeadline()
 {
-    return QDeadlineTimer(Protocol::CallTimeoutMs);
+    return QDeadlineTimer(DeviceConnection::callTimeoutMs());
 }
 
 QByteArray chunkRequest(quint32 transferId, const char* data, qint64 length)
@@ -40,7 +40,7 @@ qint32 TransferPipeline::upload(quint32 transferId, QIODevice& source, quint64 s
         const qint64 wanted = qint64(std::min<quint64>(size - sent, Protocol::TransferChunkSize));
         const qint64 got = source.read(buffer.data(), wanted);
         if (got != wanted) {
-            const qint32 pending = drain();
+            const qint32 pending = drain(Operation::UploadChunk);
             return pending != 0 ? pending : qint32(PortlexError::LocalFileError);
         }
         qint32 result = m_connection.post(Operation::UploadChunk, chunkRequest(transferId, buffer.constData(), got),
@@ -55,15 +55,15 @@ qint32 TransferPipeline::upload(quint32 transferId, QIODevice& source, quint64 s
                 return result;
         }
     }
-    return drain();
+    return drain(Operation::UploadChunk);
 }
 
-qint32 TransferPipeline::drain()
+qint32 TransferPipeline::drain(Operation operation)
 {
     qint32 first = 0;
     while (m_connection.pendingAnswers() > 0) {
         QByteArray body;
-        const qint32 result = m_connection.collect(Operation::UploadChunk, &body, chunkDeadline());
+        const qint32 result = m_connection.collect(operation, &body, chunkDeadline());
         if (first == 0)
             first = result;
     }
@@ -96,12 +96,13 @@ qint32 TransferPipeline::download(quint32 transferId, QIODevice& sink, quint64 s
             return PortlexError::ProtocolError;
         if (bytes.isEmpty()) {
             // The file shrank on the device: what is pending is empty as well.
-            while (m_connection.pendingAnswers() > 0)
-                m_connection.collect(Operation::CopyToPCChunk, &body, chunkDeadline());
-            return PortlexError::TransferIncomplete;
+            const qint32 pending = drain(Operation::CopyToPCChunk);
+            return pending != 0 ? pending : qint32(PortlexError::TransferIncomplete);
         }
-        if (sink.write(bytes) != bytes.size())
-            return PortlexError::LocalFileError;
+        if (sink.write(bytes) != bytes.size()) {
+            const qint32 pending = drain(Operation::CopyToPCChunk);
+            return pending != 0 ? pending : qint32(PortlexError::LocalFileError);
+        }
         received += quint64(bytes.size());
     }
     return 0;

@@ -1,5 +1,7 @@
 #pragma once
 
+#include "Protocol.h"
+
 #include <QtGlobal>
 
 class DeviceConnection;
@@ -7,7 +9,9 @@ class QIODevice;
 
 // Moves the bytes of one open transfer over a device connection, keeping a few chunk
 // requests in flight so that round trips do not bound the speed. Every chunk gets the
-// full call timeout, so a long transfer is never cut for taking long as a whole.
+// full call timeout, so a long transfer is never cut for taking long as a whole. A
+// failure other than a transport failure leaves the connection in step (no answers
+// pending), so that the transfer can be ended on it.
 class TransferPipeline
 {
 public:
@@ -23,7 +27,8 @@ public:
     qint32 download(quint32 transferId, QIODevice& sink, quint64 size);
 
 private:
-    qint32 drain();
+    // Collects every pending answer; the first failure, else 0.
+    qint32 drain(Operation operation);
 
     DeviceConnection& m_connection;
 };

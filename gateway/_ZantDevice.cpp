@@ -38,7 +38,7 @@ void readField(QDataStream& in, T& value)
 bool transportFailure(int result)
 {
     return result == PortlexError::Timeout || result == PortlexError::Unreachable || result == PortlexError::ProtocolError
-        || result == PortlexError::VersionMismatch;
+        || result == PortlexError::VersionMismatch || result == PortlexError::Untrusted;
 }
 
 } // namespace
@@ -77,7 +77,11 @@ int _ZantDevice::call(Operation operation, const QByteArray& request, QByteArray
     flags.setFlag(Protocol::SignatureLockRequest, signature);
 
     DeviceConnection& connection = ThreadConnections::forDevice(m_lifetime, socketPath());
-    const int result = connection.call(operation, request, flags, body, QDeadlineTimer(Protocol::CallTimeoutMs));
+    {
+        QMutexLocker lock(&m_mutex);
+        connection.setConnectRequest(operation == Operation::Connect ? QByteArray() : m_connectRequest);
+    }
+    const int result = connection.call(operation, request, flags, body, QDeadlineTimer(DeviceConnection::callTimeoutMs()));
     if (transportFailure(result)) {
         // Keep the requests for the next call, which reaches the device again.
         if (service)
@@ -106,7 +110,8 @@ bool _ZantDevice::attach(const QString& user, const QString& password, int* code
 {
     QByteArray body;
     QString error;
-    *code = call(Operation::Connect, pack(user, password), &body, &error);
+    const QByteArray connect = pack(user, password);
+    *code = call(Operation::Connect, connect, &body, &error);
     if (transportFailure(*code)) {
         *reason = error;
         return false;
@@ -118,6 +123,10 @@ bool _ZantDevice::attach(const QString& user, const QString& password, int* code
     if (*code != 0) {
         *reason = status;
         return false;
+    }
+    {
+        QMutexLocker lock(&m_mutex);
+        m_connectRequest = connect;
     }
     DeviceCache filled;
     *code = query(Operation::GetCache, QByteArray(), filled);
@@ -266,10 +275,14 @@ int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPat
     } else {
         result = PortlexError::LocalFileError;
     }
-    QByteArray body;
-    const int ended = call(Operation::CopyToPCEnd, pack(transferId), &body);
-    if (result == 0)
-        result = ended;
+    // After a transport failure the connection, and the transfer with it, is gone
+    // already; a clean-up call would only wait for a hung device once more.
+    if (!transportFailure(result)) {
+        QByteArray body;
+        const int ended = call(Operation::CopyToPCEnd, pack(transferId), &body);
+        if (result == 0)
+            result = ended;
+    }
     if (result != 0) {
         sink.cancelWriting();
         return result;

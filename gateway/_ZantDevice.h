@@ -27,8 +27,11 @@
 
 // One device reachable through the gateway. Any thread may call it, several at once:
 // each calling thread talks to the device over a connection of its own, and every call
-// returns within Protocol::CallTimeoutMs. Results are 0 for success, else a code from
-// PortlexErrors.h or one the device chose; on failure the output arguments are unchanged.
+// returns once the device has been silent for Protocol::CallTimeoutMs (a device busy
+// with a long request says so, and is waited for). After such a transport failure no
+// clean-up call follows: the device drops the connection's transfers with it. Results
+// are 0 for success, else a code from PortlexErrors.h or one the device chose; on
+// failure the output arguments are unchanged.
 class _ZantDevice
 {
 public:
@@ -94,6 +97,7 @@ private:
 
     mutable QMutex m_mutex;
     QString m_socketPath;
+    QByteArray m_connectRequest;  // the accepted Connect, repeated on every new connection
     std::atomic<bool> m_connected { false };
     std::shared_ptr<int> m_lifetime;  // lets threads' connections notice that the device is gone
 };

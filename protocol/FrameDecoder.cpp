@@ -27,8 +27,8 @@ FrameDecoder::Status FrameDecoder::next(Frame* frame)
         return Status::Malformed;
     }
     const quint32 size = qFromBigEndian<quint32>(header + 4);
-    if (size > Protocol::MaxPayloadSize) {
-        m_error = QStringLiteral("Frame of %1 bytes exceeds the limit of %2 bytes").arg(size).arg(Protocol::MaxPayloadSize);
+    if (size > m_maxPayload) {
+        m_error = QStringLiteral("Frame of %1 bytes exceeds the limit of %2 bytes").arg(size).arg(m_maxPayload);
         return Status::Malformed;
     }
     if (available - Protocol::HeaderSize < qsizetype(size))

@@ -17,15 +17,22 @@ public:
         Malformed,  // the stream cannot be framed; the connection must close
     };
 
+    // A frame announcing more than maxPayload bytes is malformed: a device takes requests
+    // of at most Protocol::MaxRequestSize, a client answers of up to MaxPayloadSize.
+    explicit FrameDecoder(quint32 maxPayload = Protocol::MaxPayloadSize) : m_maxPayload(maxPayload) {}
+
     void feed(const QByteArray& bytes);
     Status next(Frame* frame);
 
     // True while bytes of an unfinished frame are buffered.
     bool hasPartialFrame() const { return m_buffer.size() > m_offset; }
+    // Memory the buffered bytes take, read or not.
+    qsizetype bufferedBytes() const { return m_buffer.size(); }
     QString errorString() const { return m_error; }
     void clear();
 
 private:
+    quint32 m_maxPayload;
     QByteArray m_buffer;
     qsizetype m_offset = 0;  // start of the first unread byte
     QString m_error;

@@ -8,6 +8,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
+
 namespace {
 
 struct OperationName
@@ -74,27 +76,44 @@ QString socketDirectory()
     return QStandardPaths::writableLocation(QStandardPaths::RuntimeLocation) + QStringLiteral("/zantro-sim");
 }
 
-bool ensureSocketDirectory(const QString& directory, QString* error)
+bool checkSocketDirectory(const QString& directory, QString* error)
 {
-    const QByteArray path = QFile::encodeName(directory);
-    if (!QDir().mkpath(directory)) {
-        *error = QStringLiteral("Cannot create the socket folder %1").arg(directory);
+    struct stat info;
+    if (::lstat(QFile::encodeName(directory).constData(), &info) != 0) {
+        *error = QStringLiteral("The socket folder %1 cannot be used: %2").arg(directory, qt_error_string(errno));
         return false;
     }
-    struct stat info;
-    if (::lstat(path.constData(), &info) != 0 || !S_ISDIR(info.st_mode)) {
-        *error = QStringLiteral("The socket folder %1 is not a plain folder").arg(directory);
+    if (!S_ISDIR(info.st_mode)) {
+        *error = QStringLiteral("The socket folder %1 is not a plain folder (a link or a file)").arg(directory);
         return false;
     }
     if (info.st_uid != ::geteuid()) {
         *error = QStringLiteral("The socket folder %1 belongs to another user").arg(directory);
         return false;
     }
-    if ((info.st_mode & 07777) != 0700 && ::chmod(path.constData(), 0700) != 0) {
-        *error = QStringLiteral("Cannot restrict the socket folder %1 to its owner").arg(directory);
+    // Anyone who may write there could swap a device's socket for their own.
+    if ((info.st_mode & (S_IWGRP | S_IWOTH)) != 0) {
+        *error = QStringLiteral("The socket folder %1 can be written by other users (mode %2); use a private folder")
+                     .arg(directory)
+                     .arg(info.st_mode & 07777, 4, 8, QLatin1Char('0'));
         return false;
     }
     return true;
+}
+
+bool ensureSocketDirectory(const QString& directory, QString* error)
+{
+    const QByteArray path = QFile::encodeName(directory);
+    struct stat info;
+    if (::lstat(path.constData(), &info) != 0 && errno == ENOENT) {
+        // Only a folder we create ourselves gets our mode; an existing one keeps its own.
+        const bool parent = QDir().mkpath(QFileInfo(directory).absolutePath());
+        if (!parent || (::mkdir(path.constData(), 0700) != 0 && errno != EEXIST)) {
+            *error = QStringLiteral("Cannot create the socket folder %1: %2").arg(directory, qt_error_string(errno));
+            return false;
+        }
+    }
+    return checkSocketDirectory(directory, error);
 }
 
 void widenSocketBuffers(qintptr descriptor)

@@ -3,13 +3,16 @@
 // The wire protocol between the gateway client (portlex) and a device (zantro-sim).
 //
 // Transport: a Unix local socket, one request at a time per connection; a client may
-// hold several connections to one device (one per calling thread).
+// hold several connections to one device (one per calling thread). The socket lives in a
+// folder of the user's own that nobody else may write to, and a client talks only to a
+// device process of its own user id.
 //
 // Frame: a fixed 20-byte header, big-endian, then the payload.
 //     quint32 magic       FrameMagic
 //     quint32 size        payload bytes that follow the header, at most MaxPayloadSize
+//                         (MaxRequestSize for requests)
 //     quint16 version     ProtocolVersion of the sender
-//     quint16 flags       RequestFlags on requests, 0 on answers
+//     quint16 flags       RequestFlags on requests, AnswerFlags on answers
 //     quint32 requestId   chosen by the client, echoed by the answer
 //     quint32 operation   an Operation; the answer repeats it
 // The payload is a QDataStream (version StreamVersion, little-endian: the byte order of
@@ -21,6 +24,15 @@
 // Every answer payload starts with `qint32 result` (0 = success, else a code from
 // PortlexErrors.h or one the device chooses); the fields listed under "answer" follow the
 // result and are present when the result is 0 unless stated otherwise.
+//
+// Still working: while a request takes long, the device may send any number of frames
+// with the StillWorking flag, the request's id and operation and an empty payload before
+// the answer. Each one restarts the client's timeout for that request; only silence
+// times out.
+//
+// Back-pressure: a device reads no further requests from a connection while answers it
+// has not yet handed to the kernel exceed a few chunks; a client that does not read its
+// answers stalls itself, not the device.
 //
 // Handshake: the first frame on every connection is Hello. A device that does not speak
 // the client's version answers VersionMismatch with a message and closes the connection.
@@ -40,6 +52,8 @@ enum class Operation : quint32
     Hello = 1,
     // request: QString user, QString password (both empty from ConnectDevice)
     // answer:  QString statusText, present whatever the result (a refusal says why)
+    // A device serves a connection only after it accepted a Connect on it (NotConnected
+    // before), so a client repeats the Connect on every connection it opens.
     Connect = 2,
     // request: empty          answer: DeviceCache
     GetCache = 3,
@@ -122,8 +136,10 @@ constexpr QDataStream::Version StreamVersion = QDataStream::Qt_6_4;
 constexpr int HeaderSize = 20;
 constexpr quint32 MaxPayloadSize = 16 * 1024 * 1024;
 constexpr quint32 TransferChunkSize = 1024 * 1024;
+// A request carries at most one chunk and a few texts.
+constexpr quint32 MaxRequestSize = TransferChunkSize + 64 * 1024;
 
-// Every gateway call completes or fails within this time.
+// Every gateway call completes or fails after this long without a frame from the device.
 constexpr int CallTimeoutMs = 5000;
 // Discovery asks every socket for its identity within this time, all at once.
 constexpr int DiscoveryTimeoutMs = 500;
@@ -141,6 +157,11 @@ enum RequestFlag : quint16
 };
 using RequestFlags = QFlags<RequestFlag>;
 
+enum AnswerFlag : quint16
+{
+    StillWorking = 0x1,  // not the answer yet: the device is busy with the request
+};
+
 bool isKnownOperation(quint32 value);
 // The operation's name as written in this header ("GetRegistry"); empty when unknown.
 QString operationName(Operation operation);
@@ -148,8 +169,10 @@ QString operationName(Operation operation);
 // The folder that holds the devices' sockets: ZANTRO_SIM_DIR, else the per-user runtime
 // location + "/zantro-sim".
 QString socketDirectory();
-// Creates the folder with mode 0700 (or tightens an existing one of ours to 0700).
-// Refuses a folder that is a link or belongs to another user.
+// Refuses a socket folder that is a link or not a folder, belongs to another user, or
+// that others may write to; error names the folder. A safe folder is left as it is.
+bool checkSocketDirectory(const QString& directory, QString* error);
+// Creates a missing folder with mode 0700, then checks it as above.
 bool ensureSocketDirectory(const QString& directory, QString* error);
 // Lets a connected socket hold a few transfer chunks in the kernel, so that a chunk does
 // not need many wake-ups of both sides to pass.

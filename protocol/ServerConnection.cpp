@@ -4,15 +4,28 @@
 #include "RequestHandler.h"
 
 #include <QLocalSocket>
+#include <QPointer>
 #include <QtDebug>
+
+#include <memory>
+
+namespace {
+
+// At most one whole request is read from the socket at a time.
+constexpr qint64 ReadSize = Protocol::HeaderSize + Protocol::MaxRequestSize;
+
+} // namespace
 
 ServerConnection::ServerConnection(QLocalSocket* socket, quint64 id, RequestHandler* handler, int latencyMs,
                                    int halfOpenTimeoutMs, QObject* parent)
     : QObject(parent), m_socket(socket), m_id(id), m_handler(handler), m_latencyMs(latencyMs)
 {
     m_socket->setParent(this);
+    // Unbounded, the socket would pull in whatever the client sends, served or not.
+    m_socket->setReadBufferSize(ReadSize);
     Protocol::widenSocketBuffers(m_socket->socketDescriptor());
     connect(m_socket, &QLocalSocket::readyRead, this, &ServerConnection::onReadyRead);
+    connect(m_socket, &QLocalSocket::bytesWritten, this, &ServerConnection::resumeWhenDrained);
     connect(m_socket, &QLocalSocket::disconnected, this, &ServerConnection::onDisconnected);
     m_halfOpenTimer.setSingleShot(true);
     m_halfOpenTimer.setInterval(halfOpenTimeoutMs);
@@ -30,24 +43,49 @@ void ServerConnection::shutdown()
     onDisconnected();  // abort() reports only a socket that was still connected
 }
 
+qint64 ServerConnection::bufferedBytes() const
+{
+    return unsentBytes() + m_decoder.bufferedBytes() + m_socket->bytesAvailable();
+}
+
+qint64 ServerConnection::unsentBytes() const
+{
+    return m_socket->bytesToWrite() + m_delayedBytes;
+}
+
 void ServerConnection::onReadyRead()
 {
-    if (m_closing)
-        return;
-    m_decoder.feed(m_socket->readAll());
     Frame frame;
-    for (;;) {
-        const FrameDecoder::Status status = m_decoder.next(&frame);
-        if (status == FrameDecoder::Status::NeedMore)
+    while (!m_closing) {
+        // A client that does not take its answers gets no more served; what it sends
+        // meanwhile waits in the kernel.
+        m_paused = unsentBytes() > MaxUnsentBytes;
+        if (m_paused)
             break;
+        const FrameDecoder::Status status = m_decoder.next(&frame);
         if (status == FrameDecoder::Status::Malformed) {
             refuse(m_decoder.errorString());
             return;
         }
-        if (!dispatch(frame))
-            return;
+        if (status == FrameDecoder::Status::Ready) {
+            if (!dispatch(frame))
+                return;
+        } else if (m_socket->bytesAvailable() > 0) {
+            m_decoder.feed(m_socket->read(ReadSize));
+        } else {
+            break;
+        }
     }
     updateHalfOpenTimer();
+}
+
+void ServerConnection::resumeWhenDrained()
+{
+    if (m_paused && !m_closing && unsentBytes() <= MaxUnsentBytes) {
+        m_paused = false;
+        // Requests already in the socket's buffer raise no new readyRead.
+        QMetaObject::invokeMethod(this, &ServerConnection::onReadyRead, Qt::QueuedConnection);
+    }
 }
 
 void ServerConnection::onDisconnected()
@@ -83,7 +121,14 @@ bool ServerConnection::dispatch(const Frame& frame)
     request.operation = static_cast<Operation>(frame.operation);
     request.flags = Protocol::RequestFlags(frame.flags);
     request.payload = frame.payload;
+    const auto answering = std::make_shared<bool>(true);
+    request.keepAlive = [connection = QPointer<ServerConnection>(this), answering, id = frame.requestId,
+                         operation = frame.operation] {
+        if (*answering && connection)
+            connection->sendStillWorking(id, operation);
+    };
     const Answer answer = m_handler->handle(request);
+    *answering = false;
     send(frame, answer.result, answer.body);
     return true;
 }
@@ -132,10 +177,27 @@ void ServerConnection::send(const Frame& request, qint32 result, const QByteArra
         out.writeRawData(body.constData(), int(body.size()));
     }
     const QByteArray bytes = answer.encode();
-    if (m_latencyMs > 0 && request.operation != quint32(Operation::Hello))
-        QTimer::singleShot(m_latencyMs, this, [this, bytes] { write(bytes); });
-    else
+    if (m_latencyMs > 0 && request.operation != quint32(Operation::Hello)) {
+        m_delayedBytes += bytes.size();
+        QTimer::singleShot(m_latencyMs, this, [this, bytes] {
+            m_delayedBytes -= bytes.size();
+            write(bytes);
+            resumeWhenDrained();
+        });
+    } else {
         write(bytes);
+    }
+}
+
+void ServerConnection::sendStillWorking(quint32 requestId, quint32 operation)
+{
+    if (m_closing)
+        return;
+    Frame notice;
+    notice.flags = Protocol::StillWorking;
+    notice.requestId = requestId;
+    notice.operation = operation;
+    write(notice.encode());
 }
 
 void ServerConnection::write(const QByteArray& bytes)
@@ -155,7 +217,8 @@ void ServerConnection::updateHalfOpenTimer()
 {
     if (m_closing)
         return;
-    const bool halfOpen = !m_greeted || m_decoder.hasPartialFrame();
+    // A frame left unread by back-pressure is the device's doing, not the client's.
+    const bool halfOpen = !m_greeted || (m_decoder.hasPartialFrame() && !m_paused);
     if (!halfOpen)
         m_halfOpenTimer.stop();
     else if (!m_halfOpenTimer.isActive())

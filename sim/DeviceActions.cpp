@@ -8,6 +8,7 @@
 #include <QFileInfo>
 
 #include <algorithm>
+#include <chrono>
 #include <cstdio>
 
 namespace {
@@ -19,13 +20,24 @@ qint32 codeFor(VolumePathResolver::Status status)
         : qint32(PortlexError::PathRefused);
 }
 
-// Installation answers carry a status text whatever the result.
+// Installation answers carry a status text whatever the result, and so do refusals that
+// the path alone does not explain.
 Answer statusFailure(qint32 code, const QString& statusText)
 {
     QByteArray body;
     PayloadStream out(&body);
     out << statusText;
     return Answer::failure(code, body);
+}
+
+qint64 monotonicMs()
+{
+    return std::chrono::duration_cast<std::chrono::milliseconds>(std::chrono::steady_clock::now().time_since_epoch()).count();
+}
+
+QString readOnlyText(const QString& devicePath)
+{
+    return QStringLiteral("%1 refused: system module folders are read-only").arg(devicePath);
 }
 
 bool isDirectory(const QString& localPath)
@@ -37,7 +49,7 @@ bool isDirectory(const QString& localPath)
 } // namespace
 
 DeviceActions::DeviceActions(DeviceState& state)
-    : m_state(state)
+    : m_state(state), m_clock(monotonicMs)
 {
 }
 
@@ -48,6 +60,9 @@ bool DeviceActions::isAction(Operation operation)
 
 Answer DeviceActions::handle(const Request& request)
 {
+    // Transfers gone quiet end first, so that the room they reserved counts as free.
+    m_now = m_clock();
+    m_transfers.discardIdle(m_now - TransferIdleLimitMs);
     switch (request.operation) {
     case Operation::CopyToPCBegin:
         return copyToPCBegin(request);
@@ -118,6 +133,7 @@ Answer DeviceActions::copyToPCBegin(const Request& request)
         return Answer::failure(PortlexError::IoError);
     transfer.size = quint64(transfer.file->size());
     transfer.volume = target.volume;
+    transfer.lastActive = m_now;
     const quint64 size = transfer.size;
     return Answer::success(m_transfers.add(std::move(transfer)), size);
 }
@@ -141,6 +157,7 @@ Answer DeviceActions::copyToPCChunk(const Request& request)
     }
     bytes.truncate(int(got));
     transfer->done += quint64(got);
+    transfer->lastActive = m_now;
     return Answer::success(bytes);
 }
 
@@ -169,6 +186,12 @@ Answer DeviceActions::copyToDeviceBegin(const Request& request)
     const VolumePathResolver::Status status = m_state.resolver().resolveForCreate(path, target);
     if (status != VolumePathResolver::Status::Ok)
         return Answer::failure(codeFor(status));
+    if (TransferTable::hasReservedName(target.devicePath))
+        return statusFailure(PortlexError::PathRefused,
+                             QStringLiteral("%1 refused: names starting with %2 or %3 are kept for the device's temporary files")
+                                 .arg(target.devicePath, TransferTable::PartialPrefix, TransferTable::StagingPrefix));
+    if (m_state.touchesSystemFolder(target.localPath))
+        return statusFailure(PortlexError::PathRefused, readOnlyText(target.devicePath));
     if (isDirectory(target.localPath))
         return Answer::failure(PortlexError::IsDirectory);
     // A file that is replaced gives its room back.
@@ -188,6 +211,7 @@ Answer DeviceActions::copyToDeviceBegin(const Request& request)
     transfer.targetPath = target.localPath;
     transfer.volume = target.volume;
     transfer.size = size;
+    transfer.lastActive = m_now;
     return Answer::success(m_transfers.add(std::move(transfer)));
 }
 
@@ -213,6 +237,7 @@ Answer DeviceActions::uploadChunk(const Request& request)
         return Answer::failure(PortlexError::IoError);
     }
     transfer->done += quint64(bytes.size());
+    transfer->lastActive = m_now;
     return Answer();
 }
 
@@ -283,6 +308,7 @@ Answer DeviceActions::installBegin(const Request& request)
     transfer.name = name;
     transfer.volume = target.volume;
     transfer.size = size;
+    transfer.lastActive = m_now;
     return Answer::success(m_transfers.add(std::move(transfer)), QStringLiteral("Receiving package %1").arg(name));
 }
 
@@ -301,12 +327,24 @@ Answer DeviceActions::installCommit(const Request& request)
         transfer.file->remove();
         return statusFailure(PortlexError::TransferIncomplete, QStringLiteral("Package %1 arrived incomplete").arg(transfer.name));
     }
+    PackageInstaller::Rules rules;
+    rules.spaceLimit = roomLeft(transfer.volume);
+    rules.refuse = [this](const QString& relativePath) { return refusedEntry(relativePath); };
+    rules.keepAlive = request.keepAlive;
     QString status;
-    const bool installed = PackageInstaller::install(transfer.file->fileName(), transfer.name, transfer.targetPath,
-                                                     roomLeft(transfer.volume), &status);
+    const bool installed = PackageInstaller::install(transfer.file->fileName(), transfer.name, transfer.targetPath, rules, &status);
     transfer.file->remove();
     m_state.filesChanged();
     return installed ? Answer::success(status) : statusFailure(PortlexError::Refused, status);
+}
+
+// A package may not bring a module that shadows a system module of the same name.
+QString DeviceActions::refusedEntry(const QString& relativePath) const
+{
+    const QFileInfo entry(relativePath);
+    if (entry.suffix().compare(QLatin1String("mif"), Qt::CaseInsensitive) == 0 && m_state.isSystemModule(entry.completeBaseName()))
+        return QStringLiteral("the entry \"%1\" would replace the system module %2").arg(relativePath, entry.completeBaseName());
+    return QString();
 }
 
 Answer DeviceActions::run(const Request& request)
@@ -350,6 +388,8 @@ Answer DeviceActions::remove(const Request& request)
     const QFileInfo entry(target.localPath);
     if (!entry.exists() && !entry.isSymLink())
         return Answer::failure(PortlexError::NotFound);
+    if (m_state.touchesSystemFolder(target.localPath))
+        return statusFailure(PortlexError::PathRefused, readOnlyText(target.devicePath));
     // removeRecursively never follows links: a link inside is removed, not what it names.
     const bool removed = isDirectory(target.localPath) ? QDir(target.localPath).removeRecursively()
                                                        : QFile::remove(target.localPath);

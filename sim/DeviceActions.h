@@ -4,20 +4,28 @@
 #include "Request.h"
 #include "TransferTable.h"
 
+#include <functional>
+
 class DeviceState;
 
 // The operations that change the device: file transfers both ways, package installation,
 // running a module and deleting files. Every device path goes through the state's
-// VolumePathResolver, so nothing outside a volume's folder is read or changed.
+// VolumePathResolver, so nothing outside a volume's folder is read or changed. System
+// module folders are read-only, and names the device keeps for its temporary files are
+// refused.
 class DeviceActions
 {
 public:
     static constexpr int DefaultRunLifetimeMs = 10000;
+    // A transfer its client has not moved for this long is ended, and its room given back.
+    static constexpr qint64 TransferIdleLimitMs = 30000;
 
     explicit DeviceActions(DeviceState& state);
 
     // How long a process started by RunApplication lives.
     void setRunLifetime(int milliseconds) { m_runLifetimeMs = milliseconds; }
+    // Milliseconds of a monotonic clock that ages the transfers; tests put in their own.
+    void setClock(std::function<qint64()> clock) { m_clock = std::move(clock); }
 
     static bool isAction(Operation operation);
     Answer handle(const Request& request);
@@ -40,8 +48,11 @@ private:
     Answer remove(const Request& request);
 
     quint64 roomLeft(int volume);
+    QString refusedEntry(const QString& relativePath) const;
 
     DeviceState& m_state;
     TransferTable m_transfers;
     int m_runLifetimeMs = DefaultRunLifetimeMs;
+    std::function<qint64()> m_clock;
+    qint64 m_now = 0; // the clock when the request being handled arrived
 };

@@ -31,6 +31,12 @@ const SettingsNodeSpec* findSettingsNode(const SettingsNodeSpec& root, const QSt
     return node;
 }
 
+// True when path is folder or lies below it.
+bool within(const QString& folder, const QString& path)
+{
+    return path == folder || path.startsWith(folder + QLatin1Char('/'));
+}
+
 qint32 codeFor(VolumePathResolver::Status status)
 {
     return status == VolumePathResolver::Status::NotFound || status == VolumePathResolver::Status::NoVolume
@@ -267,6 +273,31 @@ bool DeviceState::inSystemFolder(int volume, const QString& devicePath) const
             return true;
     }
     return false;
+}
+
+bool DeviceState::touchesSystemFolder(const QString& localPath) const
+{
+    for (int v = 0; v < m_profile.volumes.size() && v < m_resolver.mountCount(); ++v) {
+        const VolumeSpec& spec = m_profile.volumes.at(v);
+        for (const QString& folder : spec.moduleFolders) {
+            VolumePathResolver::Target system;
+            if (folder == spec.installFolder
+                || m_resolver.resolveExisting(VolumePathResolver::joinDevicePath(m_resolver.mountPoint(v), folder), system)
+                    != VolumePathResolver::Status::Ok)
+                continue;
+            if (within(system.localPath, localPath) || within(localPath, system.localPath))
+                return true;
+        }
+    }
+    return false;
+}
+
+bool DeviceState::isSystemModule(const QString& name) const
+{
+    const QVector<ModuleCatalog::Module>& list = m_catalog.modules();
+    return std::any_of(list.cbegin(), list.cend(), [&name](const ModuleCatalog::Module& module) {
+        return module.system && module.info.name.compare(name, Qt::CaseInsensitive) == 0;
+    });
 }
 
 QString DeviceState::attributesOf(const DirectoryListing::Entry& file, bool system)

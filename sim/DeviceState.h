@@ -57,6 +57,12 @@ public:
 
     // For the actions: where device paths lead, and the room left on a volume.
     const VolumePathResolver& resolver() const { return m_resolver; }
+    const ModuleCatalog& catalog() const { return m_catalog; }
+    // True when localPath is a system module folder, lies inside one or holds one: the
+    // device neither writes nor deletes there.
+    bool touchesSystemFolder(const QString& localPath) const;
+    // True when a module of that name (letter case ignored) lives in a system module folder.
+    bool isSystemModule(const QString& name) const;
     quint64 freeSpace(int volume);
     // Starts a process that ends after about lifetimeMs. Returns its id.
     quint32 startProcess(const ProcessSpec& spec, int lifetimeMs);

@@ -1,13 +1,26 @@
 #include "ImageCopy.h"
 
+#include <QCoreApplication>
 #include <QDir>
 #include <QFile>
 #include <QFileInfo>
+#include <QRegularExpression>
 
+#include <cerrno>
 #include <climits>
+#include <csignal>
+#include <limits>
+#include <sys/stat.h>
 #include <unistd.h>
 
 namespace {
+
+const QString CopyPrefix = QStringLiteral("zantro-sim-image-");
+
+bool processAlive(pid_t pid)
+{
+    return ::kill(pid, 0) == 0 || errno == EPERM;
+}
 
 // QFile::copy syncs every file to disk, which makes copying an image of thousands of files
 // take seconds; a copy for one run of the simulator needs no such durability.
@@ -56,4 +69,29 @@ bool ImageCopy::copyTree(const QString& source, const QString& target, QString* 
         }
     }
     return true;
+}
+
+QString ImageCopy::copyTemplate(const QString& folder)
+{
+    return QDir(folder).filePath(CopyPrefix + QString::number(QCoreApplication::applicationPid()) + QStringLiteral("-XXXXXX"));
+}
+
+int ImageCopy::removeOrphanedCopies(const QString& folder)
+{
+    static const QRegularExpression name(QStringLiteral("^%1([1-9][0-9]{0,9})-[A-Za-z0-9]{6}$").arg(CopyPrefix));
+    int removed = 0;
+    const QStringList entries = QDir(folder).entryList(QDir::Dirs | QDir::NoDotAndDotDot | QDir::Hidden | QDir::NoSymLinks);
+    for (const QString& entry : entries) {
+        const QRegularExpressionMatch match = name.match(entry);
+        const qlonglong pid = match.hasMatch() ? match.captured(1).toLongLong() : 0;
+        if (pid <= 0 || pid > std::numeric_limits<pid_t>::max() || processAlive(pid_t(pid)))
+            continue;
+        // lstat: the entry itself, so a link put in its place since the listing is not followed.
+        const QString path = QDir(folder).filePath(entry);
+        struct stat info {};
+        if (::lstat(QFile::encodeName(path).constData(), &info) != 0 || !S_ISDIR(info.st_mode) || info.st_uid != ::geteuid())
+            continue;
+        removed += QDir(path).removeRecursively() ? 1 : 0;
+    }
+    return removed;
 }

@@ -14,6 +14,8 @@
 
 #include <algorithm>
 
+#include <sys/stat.h>
+
 namespace {
 
 constexpr qint64 MaxSidecarSize = 64 * 1024;
@@ -60,6 +62,19 @@ quint32 parseSignature(const QString& text)
     return states.value(text.toLower(), ModuleInfo::SignatureInvalid);
 }
 
+// Changes whenever the file is replaced or written, even within one clock tick.
+QByteArray fileStamp(const QString& path)
+{
+    struct stat info {};
+    if (::stat(QFile::encodeName(path).constData(), &info) != 0)
+        return QByteArray();
+    QByteArray stamp;
+    for (const qint64 value : {qint64(info.st_dev), qint64(info.st_ino), qint64(info.st_size), qint64(info.st_mtim.tv_sec),
+                               qint64(info.st_mtim.tv_nsec), qint64(info.st_ctim.tv_sec), qint64(info.st_ctim.tv_nsec)})
+        stamp.append(reinterpret_cast<const char*>(&value), sizeof value);
+    return stamp;
+}
+
 qint64 fileSize(const QString& path)
 {
     const QFileInfo info(path);
@@ -92,6 +107,7 @@ void ModuleCatalog::scan(const QList<VolumeSpec>& volumes, const VolumePathResol
 {
     m_modules.clear();
     m_byKey.clear();
+    QHash<QString, Decoded> found;
     for (int v = 0; v < volumes.size() && v < resolver.mountCount(); ++v) {
         const VolumeSpec& volume = volumes.at(v);
         for (const QString& folder : volume.moduleFolders) {
@@ -99,9 +115,10 @@ void ModuleCatalog::scan(const QList<VolumeSpec>& volumes, const VolumePathResol
             const QString deviceFolder = VolumePathResolver::joinDevicePath(resolver.mountPoint(v), folder);
             if (resolver.resolveExisting(deviceFolder, target) != VolumePathResolver::Status::Ok)
                 continue;
-            scanFolder(target.localPath, target.devicePath, folder != volume.installFolder, resolver, v);
+            scanFolder(target.localPath, target.devicePath, folder != volume.installFolder, resolver, v, found);
         }
     }
+    m_decoded = std::move(found); // MIFs that went are forgotten
     for (int i = 0; i < m_modules.size(); ++i) {
         Module& module = m_modules[i];
         module.info.moduleId = quint32(i + 1);
@@ -113,8 +130,23 @@ void ModuleCatalog::scan(const QList<VolumeSpec>& volumes, const VolumePathResol
     }
 }
 
+ModuleCatalog::Decoded ModuleCatalog::decode(const QString& mifPath, const QByteArray& stamp)
+{
+    Decoded decoded;
+    decoded.stamp = stamp;
+    const qint64 size = fileSize(mifPath);
+    if (size > MaxMifSize) {
+        qWarning("Not reading %s: %lld bytes is more than a MIF may have (%lld)", qPrintable(mifPath), size, MaxMifSize);
+        return decoded;
+    }
+    ++m_mifReads;
+    MifReader reader;
+    decoded.readable = reader.readFile(mifPath) && reader.decodeModule(decoded.mif);
+    return decoded;
+}
+
 void ModuleCatalog::scanFolder(const QString& localFolder, const QString& deviceFolder, bool system,
-                               const VolumePathResolver& resolver, int volume)
+                               const VolumePathResolver& resolver, int volume, QHash<QString, Decoded>& found)
 {
     QStringList mifs;
     QDirIterator it(localFolder, QDir::Files | QDir::NoSymLinks | QDir::Hidden, QDirIterator::Subdirectories);
@@ -144,8 +176,14 @@ void ModuleCatalog::scanFolder(const QString& localFolder, const QString& device
         if (!QFileInfo(sidecar.fileName()).isSymLink() && sidecar.open(QIODevice::ReadOnly))
             readSidecar(sidecar.read(MaxSidecarSize), module.info);
 
-        MifReader reader;
-        module.mifReadable = reader.readFile(mifPath) && reader.decodeModule(module.mif);
+        const QByteArray stamp = fileStamp(mifPath);
+        const auto known = m_decoded.constFind(mifPath);
+        const Decoded decoded = known != m_decoded.constEnd() && !stamp.isEmpty() && known->stamp == stamp
+            ? *known
+            : decode(mifPath, stamp);
+        found.insert(mifPath, decoded);
+        module.mif = decoded.mif;
+        module.mifReadable = decoded.readable;
         module.mif.fileName = mifInfo.fileName();
         module.mif.filePath = module.info.path;
         m_modules.append(module);

@@ -34,6 +34,18 @@ bool PackageExtractor::fail(const QString& message)
     return false;
 }
 
+void PackageExtractor::progress(quint64 bytes, int entries)
+{
+    m_bytesSinceBeat += bytes;
+    m_entriesSinceBeat += entries;
+    if (m_bytesSinceBeat < KeepAliveBytes && m_entriesSinceBeat < KeepAliveEntries)
+        return;
+    m_bytesSinceBeat = 0;
+    m_entriesSinceBeat = 0;
+    if (m_keepAlive)
+        m_keepAlive();
+}
+
 QString PackageExtractor::safeRelativePath(const QString& name)
 {
     if (name.isEmpty() || name.size() > MaxEntryPathLength || name.startsWith(QLatin1Char('/')))
@@ -56,6 +68,8 @@ bool PackageExtractor::extract(const QString& packagePath, const QString& folder
 {
     m_error.clear();
     m_topLevel.clear();
+    m_bytesSinceBeat = 0;
+    m_entriesSinceBeat = 0;
     const quint64 packedBytes = quint64(std::max<qint64>(0, QFileInfo(packagePath).size()));
     const quint64 ratioLimit = std::max(RatioFreeBytes, packedBytes * MaxCompressionRatio);
 
@@ -84,6 +98,11 @@ bool PackageExtractor::extract(const QString& packagePath, const QString& folder
             return fail(QStringLiteral("the entry \"%1\" would leave the install folder").arg(name));
         if (archive_entry_hardlink(entry))
             return fail(QStringLiteral("the entry \"%1\" is a hard link").arg(name));
+        if (m_check) {
+            const QString refusal = m_check(relative);
+            if (!refusal.isEmpty())
+                return fail(refusal);
+        }
         const mode_t type = archive_entry_filetype(entry);
         if (type == AE_IFDIR) {
             if (!root.mkpath(relative))
@@ -114,6 +133,7 @@ bool PackageExtractor::extract(const QString& packagePath, const QString& folder
                     return fail(QStringLiteral("the package is compressed beyond belief (more than %1:1)").arg(MaxCompressionRatio));
                 if (out.write(buffer.constData(), got) != got)
                     return fail(QStringLiteral("cannot write \"%1\"").arg(name));
+                progress(quint64(got), 0);
             }
             if (!out.flush())
                 return fail(QStringLiteral("cannot write \"%1\"").arg(name));
@@ -121,6 +141,7 @@ bool PackageExtractor::extract(const QString& packagePath, const QString& folder
         const QString top = relative.section(QLatin1Char('/'), 0, 0);
         if (!m_topLevel.contains(top))
             m_topLevel.append(top);
+        progress(0, 1);
     }
     if (m_topLevel.isEmpty())
         return fail(QStringLiteral("the package is empty"));

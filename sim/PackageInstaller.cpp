@@ -29,7 +29,7 @@ QString makeStaging(const QString& installFolder)
 } // namespace
 
 bool PackageInstaller::install(const QString& packagePath, const QString& packageName, const QString& installFolder,
-                               quint64 spaceLimit, QString* statusText)
+                               const Rules& rules, QString* statusText)
 {
     const QString staging = makeStaging(installFolder);
     if (staging.isEmpty()) {
@@ -37,8 +37,14 @@ bool PackageInstaller::install(const QString& packagePath, const QString& packag
         return false;
     }
     PackageExtractor extractor;
+    extractor.setKeepAlive(rules.keepAlive);
+    extractor.setEntryCheck([&rules](const QString& relativePath) {
+        if (TransferTable::hasReservedName(relativePath))
+            return QStringLiteral("the entry \"%1\" has a name the device keeps for its own temporary files").arg(relativePath);
+        return rules.refuse ? rules.refuse(relativePath) : QString();
+    });
     bool ok = QDir(staging).mkdir(QStringLiteral("new"))
-        && extractor.extract(packagePath, QDir(staging).filePath(QStringLiteral("new")), spaceLimit);
+        && extractor.extract(packagePath, QDir(staging).filePath(QStringLiteral("new")), rules.spaceLimit);
     if (!ok)
         *statusText = QStringLiteral("Package %1 refused: %2").arg(packageName, extractor.errorString());
     else if (!(ok = moveIntoPlace(staging, extractor.topLevelNames(), installFolder)))

@@ -84,33 +84,59 @@ bool SimRequestHandler::requestPath(const Request& request, QString& path)
     }
 }
 
+void SimRequestHandler::connectionClosed(quint64 connectionId)
+{
+    m_connected.remove(connectionId);
+    m_actions.connectionClosed(connectionId);
+}
+
 Answer SimRequestHandler::handle(const Request& request)
 {
-    if (request.flags.testFlag(Protocol::ServiceLockRequest))
-        m_state.lockService();
-    if (request.flags.testFlag(Protocol::SignatureLockRequest))
-        m_state.lockSignature();
+    if (request.operation == Operation::Connect) {
+        const Answer answer = answerConnect();
+        if (answer.result == 0) {
+            m_connected.insert(request.connectionId);
+            applyLockRequests(request.flags);
+        } else {
+            m_connected.remove(request.connectionId);
+        }
+        return answer;
+    }
+    // Before an accepted Connect the device answers, but neither serves nor takes a lock request.
+    if (!m_connected.contains(request.connectionId))
+        return Answer::failure(PortlexError::NotConnected);
+    applyLockRequests(request.flags);
 
     QString path;
     if (!requestPath(request, path))
         return Answer::failure(PortlexError::BadRequest);
     qint32 code = 0;
-    if (m_failures.match(Protocol::operationName(request.operation), path, code)) {
-        if (request.operation == Operation::Connect)
-            return statusFailure(code, QStringLiteral("Connection refused by --fail"));
+    if (m_failures.match(Protocol::operationName(request.operation), path, code))
         return Answer::failure(code);
-    }
     return serve(request, path);
+}
+
+Answer SimRequestHandler::answerConnect()
+{
+    qint32 code = 0;
+    if (m_failures.match(Protocol::operationName(Operation::Connect), QString(), code))
+        return statusFailure(code, QStringLiteral("Connection refused by --fail"));
+    if (m_refuseCode != 0)
+        return statusFailure(m_refuseCode, m_refuseText);
+    return Answer::success(QStringLiteral("Connected to %1").arg(displayName()));
+}
+
+void SimRequestHandler::applyLockRequests(Protocol::RequestFlags flags)
+{
+    if (flags.testFlag(Protocol::ServiceLockRequest))
+        m_state.lockService();
+    if (flags.testFlag(Protocol::SignatureLockRequest))
+        m_state.lockSignature();
 }
 
 Answer SimRequestHandler::serve(const Request& request, const QString& path)
 {
     switch (request.operation) {
-    case Operation::Connect: {
-        if (m_refuseCode == 0)
-            return Answer::success(QStringLiteral("Connected to %1").arg(displayName()));
-        return statusFailure(m_refuseCode, m_refuseText);
-    }
     case Operation::GetCache:
         return Answer::success(m_state.cache());
     case Operation::GetModules:

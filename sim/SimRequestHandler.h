@@ -4,13 +4,15 @@
 #include "FailurePlan.h"
 #include "RequestHandler.h"
 
+#include <QSet>
 #include <QString>
 
 class DeviceState;
 
 // Answers the gateway's requests from a DeviceState: applies the lock requests a request
 // carries, the --fail rules and a refused connection, then builds the answer that
-// Protocol.h lists for the operation.
+// Protocol.h lists for the operation. A connection is served only after its Connect was
+// accepted; before that every other request answers NotConnected and changes nothing.
 class SimRequestHandler : public RequestHandler
 {
 public:
@@ -24,7 +26,7 @@ public:
     QString displayName() const override;
     QString deviceId() const override;
     Answer handle(const Request& request) override;
-    void connectionClosed(quint64 connectionId) override { m_actions.connectionClosed(connectionId); }
+    void connectionClosed(quint64 connectionId) override;
 
     // The operations a request can carry, and their names (what --fail may name).
     static QList<Operation> operations();
@@ -34,6 +36,8 @@ public:
     static bool requestPath(const Request& request, QString& path);
 
 private:
+    Answer answerConnect();
+    void applyLockRequests(Protocol::RequestFlags flags);
     Answer serve(const Request& request, const QString& path);
     Answer enablement(bool service);
 
@@ -42,4 +46,5 @@ private:
     FailurePlan m_failures;
     qint32 m_refuseCode = 0;
     QString m_refuseText;
+    QSet<quint64> m_connected; // connections whose last Connect was accepted
 };

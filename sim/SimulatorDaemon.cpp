@@ -37,7 +37,9 @@ bool SimulatorDaemon::start(const SimOptions& options)
     if (!QFileInfo(QDir(imageDir).filePath(QStringLiteral("device.xml"))).isFile())
         return fail(QStringLiteral("%1 is not a device image (no device.xml)").arg(imageDir));
     if (options.reset) {
-        m_copy = std::make_unique<QTemporaryDir>(QDir::tempPath() + QStringLiteral("/zantro-sim-image-XXXXXX"));
+        // Copies left by simulators that were killed go first.
+        ImageCopy::removeOrphanedCopies(QDir::tempPath());
+        m_copy = std::make_unique<QTemporaryDir>(ImageCopy::copyTemplate(QDir::tempPath()));
         QString error;
         if (!m_copy->isValid() || !ImageCopy::copyTree(imageDir, m_copy->path(), &error))
             return fail(QStringLiteral("cannot copy the image: %1").arg(error.isEmpty() ? m_copy->errorString() : error));

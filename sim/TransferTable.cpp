@@ -21,6 +21,14 @@ void removeFile(std::unique_ptr<QFile>& file)
 
 } // namespace
 
+bool TransferTable::hasReservedName(const QString& path)
+{
+    const QStringList parts = path.split(QLatin1Char('/'), Qt::SkipEmptyParts);
+    return std::any_of(parts.cbegin(), parts.cend(), [](const QString& part) {
+        return part.startsWith(PartialPrefix) || part.startsWith(StagingPrefix);
+    });
+}
+
 TransferTable::~TransferTable()
 {
     while (!m_transfers.empty())
@@ -76,6 +84,17 @@ void TransferTable::discardConnection(quint64 connectionId)
         discard(id);
 }
 
+void TransferTable::discardIdle(qint64 cutoff)
+{
+    QList<quint32> ids;
+    for (const auto& [id, transfer] : m_transfers) {
+        if (transfer.lastActive < cutoff)
+            ids.append(id);
+    }
+    for (quint32 id : std::as_const(ids))
+        discard(id);
+}
+
 bool TransferTable::full(quint64 connectionId) const
 {
     const auto open = std::count_if(m_transfers.cbegin(), m_transfers.cend(),
@@ -114,8 +133,7 @@ int TransferTable::sweep(const QString& root)
                     QDirIterator::Subdirectories);
     while (it.hasNext()) {
         it.next();
-        const QString name = it.fileName();
-        if (name.startsWith(PartialPrefix) || name.startsWith(StagingPrefix))
+        if (hasReservedName(it.fileName()))
             leftovers.append(it.filePath());
     }
     int removed = 0;

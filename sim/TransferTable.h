@@ -29,11 +29,15 @@ public:
         int volume = -1;
         quint64 size = 0;             // bytes announced
         quint64 done = 0;             // bytes moved so far
+        qint64 lastActive = 0;        // when its client last moved it (ms of the actions' clock)
     };
 
     // Names of the temporary files and folders; nothing else starts with these.
     static const QString PartialPrefix;
     static const QString StagingPrefix;
+    // True when a part of the slash-separated path starts with one of those prefixes: the
+    // device refuses to create such a name, as the next start would sweep it away.
+    static bool hasReservedName(const QString& path);
 
     // A client may keep this many transfers open at once, so it cannot use up the files
     // the device can hold open.
@@ -51,6 +55,9 @@ public:
     // Ends the transfer; an upload's temporary file is deleted.
     void discard(quint32 id);
     void discardConnection(quint64 connectionId);
+    // Ends every transfer last active before cutoff, so that a client gone quiet gives back
+    // the room it reserved and the files it held open.
+    void discardIdle(qint64 cutoff);
 
     // Bytes promised to the volume's unfinished uploads.
     quint64 reservedBytes(int volume) const;

@@ -4,14 +4,10 @@
 #include "PlatformGenerator.h"
 #include "Portlex.h"
 
-#include <QDir>
-#include <QDirIterator>
-#include <QFile>
-#include <QRandomGenerator>
-#include <QSet>
+#include "TestSupport.h"
+
 #include <QTemporaryDir>
 #include <QThread>
-#include <QtEndian>
 #include <QtTest>
 
 #include <sys/inotify.h>
@@ -21,6 +17,8 @@
 #include <algorithm>
 #include <climits>
 #include <memory>
+
+using TestSupport::writeFile;
 
 namespace {
 
@@ -94,19 +92,12 @@ QByteArray moduleBytes(const QVector<quint32>& classes)
     return MifWriter::moduleData(entry);
 }
 
-bool writeBytes(const QString& path, const QByteArray& bytes)
-{
-    QDir().mkpath(QFileInfo(path).absolutePath());
-    QFile file(path);
-    return file.open(QIODevice::WriteOnly) && file.write(bytes) == bytes.size();
-}
-
 QStringList writeFlatFolder(const QString& folder, int count)
 {
     QStringList paths;
     for (int i = 0; i < count; ++i) {
         paths << QDir(folder).filePath(QStringLiteral("m%1.mif").arg(i, 3, 10, QLatin1Char('0')));
-        if (!writeBytes(paths.last(), moduleBytes({ quint32(i + 1) })))
+        if (!writeFile(paths.last(), moduleBytes({ quint32(i + 1) })))
             return QStringList();
     }
     return paths;
@@ -138,320 +129,217 @@ class PlatformScanTest : public QObject
     Q_OBJECT
 
 private slots:
-    void findsMifsInNestedFoldersWithAnySuffixCase();
-    void orderFollowsRelativePathsNotCreationOrder();
-    void brokenFilesAreSkipped_data();
-    void brokenFilesAreSkipped();
-    void progressSequenceOnCallingThread_data();
-    void progressSequenceOnCallingThread();
-    void cancelStopsAtOnce_data();
-    void cancelStopsAtOnce();
-    void readerStartsNoFileAfterCancel();
-    void emptyOrMissingFolder_data();
-    void emptyOrMissingFolder();
-    void linkedFoldersAreEnteredOnce();
-    void generatedPlatform();
-};
-
-void PlatformScanTest::findsMifsInNestedFoldersWithAnySuffixCase()
-{
-    QTemporaryDir dir;
-    const QStringList mifs = { "top.mif", "UPPER.MIF", "Mixed.Mif", "a/b/c/d/deep.mIf", "a/second.mif",
-                               "folder.mif/inner.mif", ".hidden.mif", "a/.cache/cached.mif" };
-    QHash<QString, QVector<quint32>> classes;
-    for (int i = 0; i < mifs.size(); ++i) {
-        classes[mifs[i]] = { 0x01011001u + quint32(i), 0x02000000u + quint32(i) };
-        QVERIFY(writeBytes(dir.filePath(mifs[i]), moduleBytes(classes[mifs[i]])));
-    }
-    for (const char* other : { "top.mif.bak", "notes.mifx", "mif", "a/readme.txt", "module.mod" })
-        QVERIFY(writeBytes(dir.filePath(other), moduleBytes({ 0x0101FFFF })));
-    // Reading a FIFO would block the scan for good.
-    QCOMPARE(::mkfifo(QFile::encodeName(dir.filePath("a/pipe.mif")).constData(), 0600), 0);
-    QVERIFY(QFile::link(dir.filePath("nowhere"), dir.filePath("dangling.mif")));
-
-    std::vector<MifEntry> entries;
-    QCOMPARE(Portlex::GetPlatformClassIds(dir.path(), entries, nullptr, nullptr), mifs.size());
-    QCOMPARE(relativePaths(entries, dir.path()), sorted(mifs));
-    for (const MifEntry& entry : entries) {
-        const QString relative = QDir(dir.path()).relativeFilePath(entry.filePath);
-        QCOMPARE(entry.filePath, dir.filePath(relative));
-        QCOMPARE(entry.fileName, QFileInfo(relative).fileName());
-        QCOMPARE(entry.classes, classes[relative]);
-        QCOMPARE(entry.classCount, quint16(2));
-        QCOMPARE(entry.header.size(), 40);
-    }
-}
-
-void PlatformScanTest::orderFollowsRelativePathsNotCreationOrder()
-{
-    const QStringList names = { "b.mif", "B.mif", "a/x.mif", "a.mif", "a0.mif", "A/y.mif", "a/z/0.mif", "a-b.mif" };
-    QTemporaryDir dir;
-    // The same tree made twice, in opposite creation order, gives the folders different orders on disk.
-    QStringList found[2];
-    for (int copy = 0; copy < 2; ++copy) {
-        const QString root = dir.filePath(QString::number(copy));
-        for (int i = 0; i < names.size(); ++i) {
-            const QString& name = copy == 0 ? names[i] : names[names.size() - 1 - i];
-            QVERIFY(writeBytes(QDir(root).filePath(name), moduleBytes({ 0x01011001 })));
-        }
-        std::vector<MifEntry> entries;
-        Portlex::GetPlatformClassIds(root, entries, nullptr, nullptr);
-        found[copy] = relativePaths(entries, root);
-    }
-    QCOMPARE(found[0], sorted(names));
-    QCOMPARE(found[1], found[0]);
-}
-
-void PlatformScanTest::brokenFilesAreSkipped_data()
-{
-    QTest::addColumn<QByteArray>("bytes");
-    const QByteArray sound = moduleBytes({ 0x01011001, 0x01011002 });
-    QByteArray offsetPastEnd = sound;
-    qToLittleEndian(quint32(0xFFFFFFF0), offsetPastEnd.data() + 32 + 8 + 6 * 4); // the last offset
-    QByteArray random(300, Qt::Uninitialized);
-    QRandomGenerator generator(7);
-    for (char& c : random)
-        c = char(generator.bounded(256));
-    MifWriter beyondBlobs;
-    beyondBlobs.addBlob(QByteArray(40, '\0'));
-    beyondBlobs.addEntry(0x5000, 0, 0, 100);
-    MifWriter otherResource;
-    otherResource.addResource(0x1234, 0, "not a module");
-    MifWriter shortHeader;
-    shortHeader.addResource(0x5000, 0, QByteArray(39, '\0'));
-
-    QTest::newRow("empty") << QByteArray();
-    QTest::newRow("file header only") << sound.left(32);
-    QTest::newRow("last byte missing") << sound.left(sound.size() - 1);
-    QTest::newRow("offset past the end") << offsetPastEnd;
-    QTest::newRow("random bytes") << random;
-    QTest::newRow("entry beyond the blobs") << beyondBlobs.data();
-    QTest::newRow("no module header") << otherResource.data();
-    QTest::newRow("module header too short") << shortHeader.data();
-}
-
-void PlatformScanTest::brokenFilesAreSkipped()
-{
-    QFETCH(QByteArray, bytes);
-    QTemporaryDir dir;
-    QVERIFY(writeBytes(dir.filePath("a.mif"), moduleBytes({ 0x01011001 })));
-    QVERIFY(writeBytes(dir.filePath("b.mif"), bytes));
-    QVERIFY(writeBytes(dir.filePath("c.mif"), moduleBytes({ 0x01011003 })));
-
-    Recorder recorder;
-    std::vector<MifEntry> entries;
-    QCOMPARE(Portlex::GetPlatformClassIds(dir.path(), entries, &Recorder::callback, &recorder), 2);
-    QCOMPARE(relativePaths(entries, dir.path()), QStringList({ "a.mif", "c.mif" }));
-    QCOMPARE(entries[1].classes, QVector<quint32>({ 0x01011003 }));
-    // The broken file still had its step.
-    QCOMPARE(recorder.calls.size(), 4);
-    QCOMPARE(recorder.calls[2].text, QStringLiteral("b.mif"));
-}
-
-void PlatformScanTest::progressSequenceOnCallingThread_data()
-{
-    QTest::addColumn<bool>("onWorker");
-    QTest::newRow("main thread") << false;
-    QTest::newRow("worker thread") << true;
-}
-
-void PlatformScanTest::progressSequenceOnCallingThread()
-{
-    QFETCH(bool, onWorker);
-    QTemporaryDir dir;
-    const QStringList names = { "z/last.MIF", "first.mif", "m/n/middle.Mif", "m/broken.mif", "m/early.mif" };
-    for (const QString& name : names)
-        QVERIFY(writeBytes(dir.filePath(name), name.contains("broken") ? QByteArray("junk") : moduleBytes({ 1 })));
-
-    Recorder recorder;
-    std::vector<MifEntry> entries;
-    int count = -1;
-    QThread* caller = QThread::currentThread();
-    const auto scan = [&] { count = Portlex::GetPlatformClassIds(dir.path(), entries, &Recorder::callback, &recorder); };
-    if (onWorker) {
-        std::unique_ptr<QThread> worker(QThread::create(scan));
-        caller = worker.get();
-        worker->start();
-        QVERIFY(worker->wait(60000));
-    } else {
-        scan();
-    }
-    QCOMPARE(count, 4);
-
-    const QStringList expected = { "first.mif", "m/broken.mif", "m/early.mif", "m/n/middle.Mif", "z/last.MIF" };
-    QCOMPARE(recorder.calls.size(), 1 + expected.size());
-    QCOMPARE(recorder.calls[0].value, -1);
-    QCOMPARE(recorder.calls[0].maximum, expected.size());
-    for (int i = 0; i < expected.size(); ++i) {
-        QCOMPARE(recorder.calls[i + 1].value, i);
-        QCOMPARE(recorder.calls[i + 1].maximum, expected.size());
-        QCOMPARE(recorder.calls[i + 1].text, QFileInfo(expected[i]).fileName());
-    }
-    for (const Call& call : recorder.calls)
-        QCOMPARE(call.thread, caller);
-}
-
-void PlatformScanTest::cancelStopsAtOnce_data()
-{
-    QTest::addColumn<int>("stopAt");
-    QTest::newRow("at the range") << -1;
-    QTest::newRow("at the first file") << 0;
-    QTest::newRow("midway") << 250;
-    QTest::newRow("at the last file") << 499;
-}
-
-void PlatformScanTest::cancelStopsAtOnce()
-{
-    QFETCH(int, stopAt);
-    QTemporaryDir dir;
-    QCOMPARE(writeFlatFolder(dir.path(), 500).size(), 500);
-    OpenCounter opens(dir.path());
-    QVERIFY(opens.isValid());
-    Recorder recorder;
-    recorder.stopAt = stopAt;
-    std::vector<MifEntry> entries { MifEntry() };
-    const int threadsBefore = threadCount();
-
-    QCOMPARE(Portlex::GetPlatformClassIds(dir.path(), entries, &Recorder::callback, &recorder), 0);
-    QVERIFY(entries.empty());
-    QCOMPARE(recorder.calls.size(), stopAt + 2);
-    QCOMPARE(recorder.calls.last().value, stopAt);
-    QCOMPARE(threadCount(), threadsBefore); // no worker outlives the scan
-    if (stopAt == -1)
-        QCOMPARE(opens.take(), 0);
-}
-
-void PlatformScanTest::readerStartsNoFileAfterCancel()
-{
-    constexpr int Threads = 3;
-    QTemporaryDir dir;
-    const QStringList paths = writeFlatFolder(dir.path(), 500);
-    QCOMPARE(paths.size(), 500);
-    OpenCounter opens(dir.path());
-    QVERIFY(opens.isValid());
+    void findsMifsInNestedFoldersWithAnySuffixCase()
     {
-        MifBatchReader reader(paths, Threads);
-        MifEntry entry;
-        QVERIFY(reader.take(0, entry));
-        QCOMPARE(entry.classes, QVector<quint32>({ 1 }));
-        reader.cancel();
-        opens.take();
+        QTemporaryDir dir;
+        const QStringList mifs = { "top.mif", "UPPER.MIF", "Mixed.Mif", "a/b/c/d/deep.mIf", "a/second.mif",
+                                   "folder.mif/inner.mif", ".hidden.mif", "a/.cache/cached.mif" };
+        QHash<QString, QVector<quint32>> classes;
+        for (int i = 0; i < mifs.size(); ++i) {
+            classes[mifs[i]] = { 0x01011001u + quint32(i), 0x02000000u + quint32(i) };
+            QVERIFY(writeFile(dir.filePath(mifs[i]), moduleBytes(classes[mifs[i]])));
+        }
+        for (const char* other : { "top.mif.bak", "notes.mifx", "mif", "a/readme.txt", "module.mod" })
+            QVERIFY(writeFile(dir.filePath(other), moduleBytes({ 0x0101FFFF })));
+        // Reading a FIFO would block the scan for good.
+        QCOMPARE(::mkfifo(QFile::encodeName(dir.filePath("a/pipe.mif")).constData(), 0600), 0);
+        QVERIFY(QFile::link(dir.filePath("nowhere"), dir.filePath("dangling.mif")));
+
+        std::vector<MifEntry> entries;
+        QCOMPARE(Portlex::GetPlatformClassIds(dir.path(), entries, nullptr, nullptr), mifs.size());
+        QCOMPARE(relativePaths(entries, dir.path()), sorted(mifs));
+        for (const MifEntry& entry : entries) {
+            const QString relative = QDir(dir.path()).relativeFilePath(entry.filePath);
+            QCOMPARE(entry.filePath, dir.filePath(relative));
+            QCOMPARE(entry.fileName, QFileInfo(relative).fileName());
+            QCOMPARE(entry.classes, classes[relative]);
+            QCOMPARE(entry.classCount, quint16(2));
+            QCOMPARE(entry.header.size(), 40);
+        }
     }
-    // Each worker may finish the file it had claimed, but claims no other.
-    QVERIFY2(opens.take() <= Threads - 1, "workers kept reading after the cancel");
-}
 
-void PlatformScanTest::emptyOrMissingFolder_data()
-{
-    QTest::addColumn<QString>("relative");
-    QTest::addColumn<bool>("useCallback");
-    QTest::newRow("empty folder") << "empty" << true;
-    QTest::newRow("missing folder") << "missing" << true;
-    QTest::newRow("only other files") << "others" << true;
-    QTest::newRow("a MIF file, not a folder") << "single.mif" << true;
-    QTest::newRow("empty path") << "" << true;
-    QTest::newRow("missing folder, no callback") << "missing" << false;
-}
+    void orderFollowsRelativePathsNotCreationOrder()
+    {
+        const QStringList names = { "b.mif", "B.mif", "a/x.mif", "a.mif", "a0.mif", "A/y.mif", "a/z/0.mif", "a-b.mif" };
+        QTemporaryDir dir;
+        // The same tree made twice, in opposite creation order, gives the folders different orders on disk.
+        QStringList found[2];
+        for (int copy = 0; copy < 2; ++copy) {
+            const QString root = dir.filePath(QString::number(copy));
+            for (int i = 0; i < names.size(); ++i) {
+                const QString& name = copy == 0 ? names[i] : names[names.size() - 1 - i];
+                QVERIFY(writeFile(QDir(root).filePath(name), moduleBytes({ 0x01011001 })));
+            }
+            std::vector<MifEntry> entries;
+            Portlex::GetPlatformClassIds(root, entries, nullptr, nullptr);
+            found[copy] = relativePaths(entries, root);
+        }
+        QCOMPARE(found[0], sorted(names));
+        QCOMPARE(found[1], found[0]);
+    }
 
-void PlatformScanTest::emptyOrMissingFolder()
-{
-    QFETCH(QString, relative);
-    QFETCH(bool, useCallback);
-    QTemporaryDir dir;
-    QVERIFY(QDir(dir.path()).mkpath("empty"));
-    QVERIFY(writeBytes(dir.filePath("others/readme.txt"), "text"));
-    QVERIFY(writeBytes(dir.filePath("others/module.mifx"), moduleBytes({ 1 })));
-    QVERIFY(writeBytes(dir.filePath("single.mif"), moduleBytes({ 1 })));
-    // An empty path must not fall back to the working folder, which holds a MIF here.
-    const QString previous = QDir::currentPath();
-    QVERIFY(QDir::setCurrent(dir.path()));
-    const QString path = relative.isEmpty() ? QString() : dir.filePath(relative);
+    void progressSequenceOnCallingThread_data()
+    {
+        QTest::addColumn<bool>("onWorker");
+        QTest::newRow("main thread") << false;
+        QTest::newRow("worker thread") << true;
+    }
 
-    Recorder recorder;
-    std::vector<MifEntry> entries { MifEntry() };
-    const int count = Portlex::GetPlatformClassIds(path, entries, useCallback ? &Recorder::callback : nullptr, &recorder);
-    QDir::setCurrent(previous);
-    QCOMPARE(count, 0);
-    QVERIFY(entries.empty());
-    QCOMPARE(recorder.calls.size(), useCallback ? 1 : 0);
-    if (useCallback) {
+    void progressSequenceOnCallingThread()
+    {
+        QFETCH(bool, onWorker);
+        QTemporaryDir dir;
+        for (const char* name : { "z/last.MIF", "first.mif", "m/n/middle.Mif" })
+            QVERIFY(writeFile(dir.filePath(name), moduleBytes({ 1 })));
+        // Broken files (which ones is MifReader's matter) are skipped, but have their step.
+        MifWriter noModule;
+        noModule.addResource(0x1234, 0, "not a module");
+        QVERIFY(writeFile(dir.filePath("m/broken.mif"), TestSupport::randomBytes(300, 7)));
+        QVERIFY(writeFile(dir.filePath("m/early.mif"), noModule.data()));
+
+        Recorder recorder;
+        std::vector<MifEntry> entries;
+        int count = -1;
+        QThread* caller = QThread::currentThread();
+        const auto scan = [&] { count = Portlex::GetPlatformClassIds(dir.path(), entries, &Recorder::callback, &recorder); };
+        if (onWorker) {
+            std::unique_ptr<QThread> worker(QThread::create(scan));
+            caller = worker.get();
+            worker->start();
+            QVERIFY(worker->wait(60000));
+        } else {
+            scan();
+        }
+        QCOMPARE(count, 3);
+        QCOMPARE(relativePaths(entries, dir.path()), QStringList({ "first.mif", "m/n/middle.Mif", "z/last.MIF" }));
+
+        const QStringList expected = { "first.mif", "m/broken.mif", "m/early.mif", "m/n/middle.Mif", "z/last.MIF" };
+        QCOMPARE(recorder.calls.size(), 1 + expected.size());
+        QCOMPARE(recorder.calls[0].value, -1);
+        QCOMPARE(recorder.calls[0].maximum, expected.size());
+        for (int i = 0; i < expected.size(); ++i) {
+            QCOMPARE(recorder.calls[i + 1].value, i);
+            QCOMPARE(recorder.calls[i + 1].maximum, expected.size());
+            QCOMPARE(recorder.calls[i + 1].text, QFileInfo(expected[i]).fileName());
+        }
+        for (const Call& call : recorder.calls)
+            QCOMPARE(call.thread, caller);
+    }
+
+    void cancelStopsAtOnce_data()
+    {
+        QTest::addColumn<int>("stopAt");
+        QTest::newRow("at the range") << -1;
+        QTest::newRow("at the first file") << 0;
+        QTest::newRow("midway") << 250;
+        QTest::newRow("at the last file") << 499;
+    }
+
+    void cancelStopsAtOnce()
+    {
+        QFETCH(int, stopAt);
+        QTemporaryDir dir;
+        QCOMPARE(writeFlatFolder(dir.path(), 500).size(), 500);
+        OpenCounter opens(dir.path());
+        QVERIFY(opens.isValid());
+        Recorder recorder;
+        recorder.stopAt = stopAt;
+        std::vector<MifEntry> entries { MifEntry() };
+        const int threadsBefore = threadCount();
+
+        QCOMPARE(Portlex::GetPlatformClassIds(dir.path(), entries, &Recorder::callback, &recorder), 0);
+        QVERIFY(entries.empty());
+        QCOMPARE(recorder.calls.size(), stopAt + 2);
+        QCOMPARE(recorder.calls.last().value, stopAt);
+        QCOMPARE(threadCount(), threadsBefore); // no worker outlives the scan
+        if (stopAt == -1)
+            QCOMPARE(opens.take(), 0);
+    }
+
+    void readerStartsNoFileAfterCancel()
+    {
+        constexpr int Threads = 3;
+        QTemporaryDir dir;
+        const QStringList paths = writeFlatFolder(dir.path(), 500);
+        QCOMPARE(paths.size(), 500);
+        OpenCounter opens(dir.path());
+        QVERIFY(opens.isValid());
+        {
+            MifBatchReader reader(paths, Threads);
+            MifEntry entry;
+            QVERIFY(reader.take(0, entry));
+            QCOMPARE(entry.classes, QVector<quint32>({ 1 }));
+            reader.cancel();
+            opens.take();
+        }
+        // Each worker may finish the file it had claimed, but claims no other.
+        QVERIFY2(opens.take() <= Threads - 1, "workers kept reading after the cancel");
+    }
+
+    void emptyOrMissingFolder_data()
+    {
+        QTest::addColumn<QString>("relative");
+        QTest::newRow("empty folder") << "empty";
+        QTest::newRow("missing folder") << "missing";
+        QTest::newRow("a MIF file, not a folder") << "single.mif";
+        QTest::newRow("empty path") << "";
+    }
+
+    void emptyOrMissingFolder()
+    {
+        QFETCH(QString, relative);
+        QTemporaryDir dir;
+        QVERIFY(QDir(dir.path()).mkpath("empty"));
+        QVERIFY(writeFile(dir.filePath("single.mif"), moduleBytes({ 1 })));
+        // An empty path must not fall back to the working folder, which holds a MIF here.
+        const QString previous = QDir::currentPath();
+        QVERIFY(QDir::setCurrent(dir.path()));
+        const QString path = relative.isEmpty() ? QString() : dir.filePath(relative);
+
+        Recorder recorder;
+        std::vector<MifEntry> entries { MifEntry() };
+        const int count = Portlex::GetPlatformClassIds(path, entries, &Recorder::callback, &recorder);
+        QDir::setCurrent(previous);
+        QCOMPARE(count, 0);
+        QVERIFY(entries.empty());
+        QCOMPARE(recorder.calls.size(), 1);
         QCOMPARE(recorder.calls[0].value, -1);
         QCOMPARE(recorder.calls[0].maximum, 0);
     }
-}
 
-void PlatformScanTest::linkedFoldersAreEnteredOnce()
-{
-    QTemporaryDir dir;
-    const QString root = dir.filePath("root");
-    QVERIFY(writeBytes(QDir(root).filePath("a/x.mif"), moduleBytes({ 1 })));
-    QVERIFY(writeBytes(dir.filePath("outside/y.mif"), moduleBytes({ 2 })));
-    QVERIFY(QFile::link(root, QDir(root).filePath("a/loop")));
-    QVERIFY(QFile::link(QDir(root).filePath("a"), QDir(root).filePath("b")));
-    QVERIFY(QFile::link(QDir(root).filePath("a/x.mif"), QDir(root).filePath("alias.mif")));
-    QVERIFY(QFile::link(dir.filePath("outside"), QDir(root).filePath("out")));
+    void linkedFoldersAreEnteredOnce()
+    {
+        QTemporaryDir dir;
+        const QString root = dir.filePath("root");
+        QVERIFY(writeFile(QDir(root).filePath("a/x.mif"), moduleBytes({ 1 })));
+        QVERIFY(writeFile(dir.filePath("outside/y.mif"), moduleBytes({ 2 })));
+        QVERIFY(QFile::link(root, QDir(root).filePath("a/loop")));
+        QVERIFY(QFile::link(QDir(root).filePath("a"), QDir(root).filePath("b")));
+        QVERIFY(QFile::link(QDir(root).filePath("a/x.mif"), QDir(root).filePath("alias.mif")));
+        QVERIFY(QFile::link(dir.filePath("outside"), QDir(root).filePath("out")));
 
-    std::vector<MifEntry> entries;
-    QCOMPARE(Portlex::GetPlatformClassIds(root, entries, nullptr, nullptr), 3);
-    QCOMPARE(relativePaths(entries, root), QStringList({ "a/x.mif", "alias.mif", "out/y.mif" }));
-    QCOMPARE(entries[1].classes, entries[0].classes);
-}
-
-void PlatformScanTest::generatedPlatform()
-{
-    constexpr int MifCount = 420; // passes every kind of broken file
-    const QVector<quint32> known = PlatformGenerator::classDatabaseIds(QCoreApplication::applicationDirPath());
-    QVERIFY2(!known.isEmpty(), "ClassDB.xml is not beside the test");
-    QTemporaryDir dir;
-    PlatformGenerator generator;
-    for (const char* copy : { "p", "q" })
-        QVERIFY2(generator.generate(dir.filePath(copy), MifCount, known), qPrintable(generator.errorString()));
-    QVERIFY(!generator.generate(dir.filePath("p"), 1, known));
-
-    QStringList expected;
-    for (int i = 0; i < MifCount; ++i) {
-        if (!PlatformGenerator::isBroken(i))
-            expected << PlatformGenerator::relativePath(i);
+        std::vector<MifEntry> entries;
+        QCOMPARE(Portlex::GetPlatformClassIds(root, entries, nullptr, nullptr), 3);
+        QCOMPARE(relativePaths(entries, root), QStringList({ "a/x.mif", "alias.mif", "out/y.mif" }));
+        QCOMPARE(entries[1].classes, entries[0].classes);
     }
-    QCOMPARE(expected.size(), MifCount - PlatformGenerator::brokenCount(MifCount));
-    QCOMPARE(PlatformGenerator::brokenCount(MifCount), 4);
 
-    std::vector<MifEntry> entries;
-    QCOMPARE(Portlex::GetPlatformClassIds(dir.filePath("p"), entries, nullptr, nullptr), expected.size());
-    QCOMPARE(relativePaths(entries, dir.filePath("p")), sorted(expected));
-    const QSet<quint32> knownSet(known.begin(), known.end());
-    int withKnown = 0;
-    int withNone = 0;
-    for (const MifEntry& entry : entries) {
-        withNone += entry.classes.isEmpty();
-        withKnown += !entry.classes.isEmpty() && knownSet.contains(entry.classes.first());
+    void generatedPlatform()
+    {
+        constexpr int MifCount = 420;  // passes every kind of broken file
+        const QVector<quint32> known = PlatformGenerator::classDatabaseIds(QCoreApplication::applicationDirPath());
+        QVERIFY2(!known.isEmpty(), "ClassDB.xml is not beside the test");
+        QTemporaryDir dir;
+        PlatformGenerator generator;
+        QVERIFY2(generator.generate(dir.filePath("p"), MifCount, known), qPrintable(generator.errorString()));
+        std::vector<MifEntry> entries, again;
+        QCOMPARE(Portlex::GetPlatformClassIds(dir.filePath("p"), entries, nullptr, nullptr),
+                 MifCount - PlatformGenerator::brokenCount(MifCount));
+        // Scanning again gives the same entries, whatever order the workers finished in.
+        Portlex::GetPlatformClassIds(dir.filePath("p"), again, nullptr, nullptr);
+        QVERIFY(again == entries);
     }
-    QCOMPARE(withKnown + withNone, int(entries.size()));
-    QVERIFY(withNone > 0);
-
-    // Scanning again gives the same entries, whatever order the workers finished in.
-    std::vector<MifEntry> again;
-    Portlex::GetPlatformClassIds(dir.filePath("p"), again, nullptr, nullptr);
-    QVERIFY(again == entries);
-
-    // The same count gives the same files with the same bytes.
-    QStringList trees[2];
-    for (int t = 0; t < 2; ++t) {
-        const QDir root(dir.filePath(t == 0 ? "p" : "q"));
-        QDirIterator files(root.path(), QDir::Files | QDir::Hidden, QDirIterator::Subdirectories);
-        while (files.hasNext())
-            trees[t] << root.relativeFilePath(files.next());
-        trees[t].sort();
-    }
-    QCOMPARE(trees[1], trees[0]);
-    QVERIFY(trees[0].size() > MifCount);
-    for (const QString& relative : trees[0]) {
-        QFile p(dir.filePath("p/" + relative));
-        QFile q(dir.filePath("q/" + relative));
-        QVERIFY(p.open(QIODevice::ReadOnly) && q.open(QIODevice::ReadOnly));
-        QCOMPARE(p.readAll(), q.readAll());
-    }
-}
+};
 
 QTEST_GUILESS_MAIN(PlatformScanTest)
 #include "tst_platformscan.moc"

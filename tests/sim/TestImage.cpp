@@ -17,17 +17,11 @@ QByteArray TestImage::defaultProfile()
   <hardware><fact key="Manufacturer" value="Test Maker"/><fact key="HeapMemory" value="1024"/></hardware>
   <media><audio format="MP3" supported="Yes"/><image format="PNG" supported="Yes"/><video format="H.263" supported="No"/></media>
   <platform name="Test Platform" directory="/opt/test">
-    <class id="0x01011001" component="core"/>
-    <class id="0x01011002"/>
-    <class id="0x01012001"/>
-    <interface id="0x02011001"/>
+    <class id="0x01011001" component="core"/><class id="0x01011002"/><class id="0x01012001"/><interface id="0x02011001"/>
   </platform>
-  <settings>
-    <value name="rootValue" text="r"/>
+  <settings><value name="rootValue" text="r"/>
     <node name="appinfo"><value name="count" text="2"/><value name="owner" text="test"/>
-      <node name="calc"><value name="version" text="1.0"/></node>
-      <node name="notes"/>
-    </node>
+      <node name="calc"><value name="version" text="1.0"/></node><node name="notes"/></node>
     <node name="CSA_REMOVAL"><node name="hidden"/></node>
   </settings>
   <processes evolve="no">
@@ -41,11 +35,6 @@ QByteArray TestImage::defaultProfile()
   <volume id="2" name="Card" mount="/card" folder="card" size="500" removable="yes"/>
 </device>
 )";
-}
-
-void TestImage::writeProfile(const QByteArray& deviceXml)
-{
-    writeFile(QStringLiteral("device.xml"), deviceXml);
 }
 
 void TestImage::writeFile(const QString& relativePath, const QByteArray& bytes)

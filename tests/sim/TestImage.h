@@ -18,7 +18,7 @@ public:
     QString outside() const { return m_outside.path(); }
 
     static QByteArray defaultProfile();
-    void writeProfile(const QByteArray& deviceXml);
+    void writeProfile(const QByteArray& deviceXml) { writeFile(QStringLiteral("device.xml"), deviceXml); }
     void writeFile(const QString& relativePath, const QByteArray& bytes);
     void addModule(const QString& relativeFolder, const SampleBuilder::ModuleSpec& module);
 

@@ -1,215 +1,128 @@
-#include "Frame.h"
-#include "FrameDecoder.h"
+#include "DeviceConnection.h"
 #include "ImageCopy.h"
-#include "PayloadStream.h"
+#include "TestSupport.h"
 
 #include <QCoreApplication>
-#include <QCryptographicHash>
-#include <QDeadlineTimer>
-#include <QDir>
-#include <QDirIterator>
 #include <QLocalSocket>
 #include <QProcess>
 #include <QTemporaryDir>
 #include <QtTest>
 
 #include <csignal>
-#include <sys/stat.h>
 
-// zantro-sim as a real process: start-up, the socket's life, clean ends on signals, --reset.
+// zantro-sim as a real process: clean ends on signals, --reset, start-up failures.
 class TestSimLifecycle : public QObject
 {
     Q_OBJECT
 
-private slots:
-    void init();
-    void cleanup();
-    void signalEndsCleanly_data();
-    void signalEndsCleanly();
-    void resetLeavesTheImageUntouched();
-    void startFailures_data();
-    void startFailures();
-
-private:
-    struct Started
-    {
-        QString servedImage;
-        QString socketPath;
-    };
-    // Starts zantro-sim and waits for its "serving" line.
-    bool start(QProcess& process, const QStringList& arguments, Started& started);
-    static bool hello(const QString& socketPath, QString& displayName, QString& deviceId);
-    static QMap<QString, QByteArray> treeHashes(const QString& folder);
-    static QString executable() { return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim"); }
-
     std::unique_ptr<QTemporaryDir> m_dir;
     QString m_image;
     QString m_sockets;
-};
 
-void TestSimLifecycle::init()
-{
-    m_dir = std::make_unique<QTemporaryDir>();
-    m_image = m_dir->filePath(QStringLiteral("image"));
-    m_sockets = m_dir->filePath(QStringLiteral("run/sockets"));
-    QString error;
-    QVERIFY2(ImageCopy::copyTree(QStringLiteral(DELVIX_SAMPLES_DIR "/devices/simulator"), m_image, &error), qPrintable(error));
-}
-
-void TestSimLifecycle::cleanup()
-{
-    m_dir.reset();
-}
-
-bool TestSimLifecycle::start(QProcess& process, const QStringList& arguments, Started& started)
-{
-    process.setProcessChannelMode(QProcess::SeparateChannels);
-    process.start(executable(), arguments);
-    const QDeadlineTimer deadline(10000);
-    QByteArray output;
-    while (!deadline.hasExpired() && !output.contains('\n')) {
-        if (!process.waitForReadyRead(int(qMax<qint64>(1, deadline.remainingTime()))))
-            break;
-        output += process.readAllStandardOutput();
-    }
-    const QString line = QString::fromLocal8Bit(output).trimmed();
-    const qsizetype on = line.lastIndexOf(QLatin1String(" on "));
-    if (!line.startsWith(QLatin1String("zantro-sim: serving ")) || on < 0) {
-        qWarning() << "zantro-sim did not start:" << line << process.readAllStandardError();
-        return false;
-    }
-    started.servedImage = line.mid(20, on - 20);
-    started.socketPath = line.mid(on + 4);
-    return true;
-}
-
-bool TestSimLifecycle::hello(const QString& socketPath, QString& displayName, QString& deviceId)
-{
-    QLocalSocket socket;
-    socket.connectToServer(socketPath);
-    if (!socket.waitForConnected(2000))
-        return false;
-    Frame request;
-    request.requestId = 1;
-    request.operation = quint32(Operation::Hello);
-    PayloadStream out(&request.payload);
-    out << Protocol::ProtocolVersion << QStringLiteral("tst_simlifecycle");
-    socket.write(request.encode());
-
-    FrameDecoder decoder;
-    Frame answer;
-    const QDeadlineTimer deadline(5000);
-    while (decoder.next(&answer) != FrameDecoder::Status::Ready) {
-        if (deadline.hasExpired() || !socket.waitForReadyRead(int(qMax<qint64>(1, deadline.remainingTime()))))
+    static QString executable() { return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim"); }
+    // Starts zantro-sim on the copied sample and reads its "serving IMAGE on SOCKET" line.
+    bool start(QProcess& process, const QStringList& extra, QString& servedImage, QString& socketPath)
+    {
+        process.start(executable(), QStringList {"--image", m_image, "--socket-dir", m_sockets} + extra);
+        QByteArray output;
+        while (!output.contains('\n') && process.waitForReadyRead(10000))
+            output += process.readAllStandardOutput();
+        const QString line = QString::fromLocal8Bit(output).trimmed();
+        const qsizetype on = line.lastIndexOf(QLatin1String(" on "));
+        if (!line.startsWith(QLatin1String("zantro-sim: serving ")) || on < 0) {
+            qWarning() << "zantro-sim did not start:" << line << process.readAllStandardError();
             return false;
-        decoder.feed(socket.readAll());
+        }
+        servedImage = line.mid(20, on - 20);
+        socketPath = line.mid(on + 4);
+        return true;
     }
-    PayloadStream in(answer.payload);
-    qint32 result = -1;
-    in >> result >> displayName >> deviceId;
-    return in.ok() && result == 0;
-}
-
-QMap<QString, QByteArray> TestSimLifecycle::treeHashes(const QString& folder)
-{
-    QMap<QString, QByteArray> hashes;
-    QDirIterator it(folder, QDir::Files | QDir::Dirs | QDir::NoDotAndDotDot | QDir::Hidden, QDirIterator::Subdirectories);
-    while (it.hasNext()) {
-        const QString path = it.next();
-        QFile file(path);
-        const QByteArray content = it.fileInfo().isFile() && file.open(QIODevice::ReadOnly) ? file.readAll() : QByteArray("dir");
-        hashes.insert(QDir(folder).relativeFilePath(path), QCryptographicHash::hash(content, QCryptographicHash::Sha1));
+    // "display name|device id" from a handshake, as the gateway sees it.
+    static QString greeting(const QString& socketPath)
+    {
+        DeviceConnection connection(socketPath);
+        if (!connection.startHandshake() || connection.finishHandshake(QDeadlineTimer(5000)) != 0)
+            return connection.errorString();
+        return connection.displayName() + '|' + connection.deviceId();
     }
-    return hashes;
-}
 
-void TestSimLifecycle::signalEndsCleanly_data()
-{
-    QTest::addColumn<int>("signalNumber");
-    QTest::newRow("SIGTERM") << int(SIGTERM);
-    QTest::newRow("SIGINT") << int(SIGINT);
-}
+private slots:
+    void init()
+    {
+        m_dir = std::make_unique<QTemporaryDir>();
+        m_image = m_dir->filePath(QStringLiteral("image"));
+        m_sockets = m_dir->filePath(QStringLiteral("run/sockets"));
+        QString error;
+        QVERIFY2(ImageCopy::copyTree(QStringLiteral(DELVIX_SAMPLES_DIR "/devices/simulator"), m_image, &error), qPrintable(error));
+    }
 
-void TestSimLifecycle::signalEndsCleanly()
-{
-    QFETCH(int, signalNumber);
-    QProcess process;
-    Started started;
-    QVERIFY(start(process, {QStringLiteral("--image"), m_image, QStringLiteral("--socket-dir"), m_sockets, QStringLiteral("--id"),
-                            QStringLiteral("life-1")}, started));
-    QCOMPARE(started.servedImage, m_image);
-    QCOMPARE(QFileInfo(started.socketPath).absolutePath(), m_sockets);
+    void signalEndsCleanly_data()
+    {
+        QTest::addColumn<int>("signalNumber");
+        QTest::newRow("SIGTERM") << int(SIGTERM);
+        QTest::newRow("SIGINT") << int(SIGINT);
+    }
 
-    struct stat info;
-    QCOMPARE(::stat(QFile::encodeName(m_sockets).constData(), &info), 0);
-    QCOMPARE(info.st_mode & 07777, mode_t(0700));
-    QCOMPARE(::lstat(QFile::encodeName(started.socketPath).constData(), &info), 0);
-    QVERIFY(S_ISSOCK(info.st_mode));
-    QCOMPARE(info.st_mode & 07777, mode_t(0600));
+    void signalEndsCleanly()
+    {
+        QFETCH(int, signalNumber);
+        QProcess process;
+        QString served, socket;
+        QVERIFY(start(process, {"--id", "life-1"}, served, socket));
+        QCOMPARE(served, m_image);
+        QCOMPARE(QFileInfo(socket).absolutePath(), m_sockets);
+        QCOMPARE(greeting(socket), "Zantro Simulator - Aurora|life-1");
+        QLocalSocket idle; // a connected client must not keep the daemon alive
+        idle.connectToServer(socket);
+        QVERIFY(idle.waitForConnected(2000));
 
-    QString name;
-    QString id;
-    QVERIFY(hello(started.socketPath, name, id));
-    QCOMPARE(name, QStringLiteral("Zantro Simulator - Aurora"));
-    QCOMPARE(id, QStringLiteral("life-1"));
+        QCOMPARE(::kill(pid_t(process.processId()), signalNumber), 0);
+        QVERIFY(process.waitForFinished(5000));
+        QCOMPARE(process.exitStatus(), QProcess::NormalExit);
+        QCOMPARE(process.exitCode(), 0);
+        QVERIFY(!QFileInfo::exists(socket) && !QFileInfo(socket).isSymLink());
+    }
 
-    QLocalSocket idle; // a connected client must not keep the daemon alive
-    idle.connectToServer(started.socketPath);
-    QVERIFY(idle.waitForConnected(2000));
+    void resetLeavesTheImageUntouched()
+    {
+        const QByteArray before = TestSupport::treeDigest(m_image);
+        QProcess process;
+        QString served, socket;
+        QVERIFY(start(process, {"--reset"}, served, socket));
+        QVERIFY(served != m_image);
+        QCOMPARE(TestSupport::treeDigest(served), before); // a full copy is served
+        QVERIFY(greeting(socket).endsWith("|aurora-sim")); // the image's own id
 
-    QCOMPARE(::kill(pid_t(process.processId()), signalNumber), 0);
-    QVERIFY(process.waitForFinished(5000));
-    QCOMPARE(process.exitStatus(), QProcess::NormalExit);
-    QCOMPARE(process.exitCode(), 0);
-    QVERIFY(!QFileInfo::exists(started.socketPath));
-    QVERIFY(!QFileInfo(started.socketPath).isSymLink());
-}
+        QCOMPARE(::kill(pid_t(process.processId()), SIGTERM), 0);
+        QVERIFY(process.waitForFinished(5000));
+        QCOMPARE(process.exitCode(), 0);
+        QVERIFY(!QFileInfo::exists(served)); // the copy goes with the daemon
+        QCOMPARE(TestSupport::treeDigest(m_image), before);
+    }
 
-void TestSimLifecycle::resetLeavesTheImageUntouched()
-{
-    const auto before = treeHashes(m_image);
-    QProcess process;
-    Started started;
-    QVERIFY(start(process, {QStringLiteral("--image"), m_image, QStringLiteral("--socket-dir"), m_sockets, QStringLiteral("--reset")},
-                  started));
-    QVERIFY(started.servedImage != m_image);
-    QCOMPARE(treeHashes(started.servedImage), before); // a full copy is served
-    QString name;
-    QString id;
-    QVERIFY(hello(started.socketPath, name, id));
-    QCOMPARE(id, QStringLiteral("aurora-sim")); // the image's own id
+    void startFailures_data()
+    {
+        QTest::addColumn<QStringList>("arguments");
+        QTest::addColumn<int>("exitCode");
+        QTest::addColumn<QByteArray>("message");
+        QTest::newRow("no image") << QStringList {"--image", "/nonexistent/image"} << 1 << QByteArray("device.xml");
+        QTest::newRow("bad option") << QStringList {"--image", "x", "--fail", "Nope=3"} << 2 << QByteArray("unknown operation");
+        QTest::newRow("help") << QStringList {"--help"} << 0 << QByteArray("--refuse-connect");
+    }
 
-    ::kill(pid_t(process.processId()), SIGTERM);
-    QVERIFY(process.waitForFinished(5000));
-    QCOMPARE(process.exitCode(), 0);
-    QVERIFY(!QFileInfo::exists(started.servedImage)); // the copy goes with the daemon
-    QCOMPARE(treeHashes(m_image), before);
-}
-
-void TestSimLifecycle::startFailures_data()
-{
-    QTest::addColumn<QStringList>("arguments");
-    QTest::addColumn<int>("exitCode");
-    QTest::addColumn<QString>("message");
-    QTest::newRow("no image") << QStringList{"--image", "/nonexistent/image"} << 1 << "device.xml";
-    QTest::newRow("bad option") << QStringList{"--image", "x", "--fail", "Nope=3"} << 2 << "unknown operation";
-    QTest::newRow("help") << QStringList{"--help"} << 0 << "";
-}
-
-void TestSimLifecycle::startFailures()
-{
-    QFETCH(QStringList, arguments);
-    QFETCH(int, exitCode);
-    QFETCH(QString, message);
-    QProcess process;
-    process.start(executable(), arguments);
-    QVERIFY(process.waitForFinished(10000));
-    QCOMPARE(process.exitCode(), exitCode);
-    if (exitCode == 0)
-        QVERIFY(process.readAllStandardOutput().contains("--refuse-connect"));
-    else
-        QVERIFY(QString::fromLocal8Bit(process.readAllStandardError()).contains(message));
-}
+    void startFailures()
+    {
+        QFETCH(QStringList, arguments);
+        QFETCH(int, exitCode);
+        QFETCH(QByteArray, message);
+        QProcess process;
+        process.start(executable(), arguments);
+        QVERIFY(process.waitForFinished(10000));
+        QCOMPARE(process.exitCode(), exitCode);
+        // Help goes to the standard output, mistakes to the error output.
+        QVERIFY((exitCode == 0 ? process.readAllStandardOutput() : process.readAllStandardError()).contains(message));
+    }
+};
 
 QTEST_GUILESS_MAIN(TestSimLifecycle)
 #include "tst_simlifecycle.moc"
