@@ -1,0 +1,477 @@
+#include "DeviceWindow.h"
+#include "MifWriter.h"
+#include "ModuleInfoDialog.h"
+#include "ModuleInfoView.h"
+#include "ModuleListView.h"
+#include "Portlex.h"
+#include "SaveXmlReport.h"
+#include "SimulatorProcess.h"
+#include "TestImage.h"
+#include "TestSupport.h"
+
+#include <QApplication>
+#include <QDesktopServices>
+#include <QDomDocument>
+#include <QPointer>
+#include <QSettings>
+#include <QTemporaryDir>
+#include <QtTest>
+
+Q_DECLARE_METATYPE(MifEntry)
+
+namespace {
+
+// Known to the class database beside the program.
+constexpr quint32 Heap = 0x01011001;
+// In no database.
+constexpr quint32 Stranger = 0x7E000001;
+constexpr quint32 OtherStranger = 0x7E000002;
+
+const QString DeviceId = QStringLiteral("tools");
+const QString OddModulePath = QStringLiteral("/usermod/odd/odd.mif");
+
+// A module whose header states other counts than its lists hold, with known and unknown ids.
+MifEntry oddModule()
+{
+    MifEntry entry;
+    entry.classes = {Heap, Stranger};
+    MifApplet applet;
+    applet.classId = Heap;
+    applet.baseId = 5;
+    applet.appType = 5;
+    applet.host = 0x0A0B0C0D;
+    applet.privSet = 0x1234;
+    applet.flags = 0x00F0;
+    entry.applets = {applet};
+    entry.externalClasses = {OtherStranger};
+    entry.notifiers = {MifNotifier{Stranger, Heap, 0xFF00FF00}};
+    entry.mimeTypes = {MifMimeType{Heap, Stranger, QStringLiteral("text/x-odd")}};
+    entry.classCount = 9;
+    entry.appletCount = 3;
+    entry.externalClassCount = 4;
+    entry.notificationCount = 1;
+    entry.mimeTypeCount = 1;
+    return entry;
+}
+
+// What the odd module shows: the counts as stored, then each table's rows (">" marks a
+// cell aligned right).
+const QStringList OddModuleLines = {
+    "counts: 9|3|4|1|1",
+    "_classIDTable: Heap|0x01011001|Kernel|Memory",
+    "_classIDTable: not found|0x7E000001|unknown|unknown",
+    "_appletTable: Heap|0x01011001|Kernel|Memory|>5|0x0005|0x0A0B0C0D|0x1234|0x00F0",
+    "_externalClassesTable: not found|0x7E000002|unknown|unknown",
+    "_notifiersTable: not found|0x7E000001|unknown|unknown|Heap|0x01011001|Kernel|Memory|0xFF00FF00",
+    "_mimeTypeTable: text/x-odd|0x01011001|Heap|Kernel|Memory|0x7E000001|not found|unknown|unknown",
+};
+
+const QString OddModuleXml = QStringLiteral(
+    "<!DOCTYPE zant-mif-entry>\n"
+    "<mifEntry classCount=\"9\" appletCount=\"3\" extClassCount=\"4\" notificationCount=\"1\" mimeTypeCount=\"1\">\n"
+    " <classes>\n"
+    "  <class name=\"Heap\" id=\"0x01011001\" family=\"Kernel\" subfamily=\"Memory\"/>\n"
+    "  <class name=\"not found\" id=\"0x7E000001\" family=\"unknown\" subfamily=\"unknown\"/>\n"
+    " </classes>\n"
+    " <applets>\n"
+    "  <applet name=\"Heap\" id=\"0x01011001\" family=\"Kernel\" subfamily=\"Memory\" baseid=\"5\" apptype=\"0x0005\""
+    " host=\"0x0A0B0C0D\" privset=\"0x1234\" flags=\"0x00F0\"/>\n"
+    " </applets>\n"
+    " <externalClasses>\n"
+    "  <externalClass name=\"not found\" id=\"0x7E000002\" family=\"unknown\" subfamily=\"unknown\"/>\n"
+    " </externalClasses>\n"
+    " <notifiers>\n"
+    "  <notifier typename=\"not found\" typeid=\"0x7E000001\" typefamily=\"unknown\" typesubfamily=\"unknown\""
+    " notifiername=\"Heap\" notifierid=\"0x01011001\" notifierfamily=\"Kernel\" notifiersubfamily=\"Memory\""
+    " mask=\"0xFF00FF00\"/>\n"
+    " </notifiers>\n"
+    " <mimetypes>\n"
+    "  <mimetype value=\"text/x-odd\" handlerid=\"0x01011001\" handlername=\"Heap\" handlerfamily=\"Kernel\""
+    " handlersubfamily=\"Memory\" baseid=\"0x7E000001\" basename=\"not found\" basefamily=\"unknown\""
+    " basesubfamily=\"unknown\"/>\n"
+    " </mimetypes>\n"
+    "</mifEntry>\n");
+
+QStringList viewLines(const ModuleInfoView* view)
+{
+    QStringList lines;
+    QStringList counts;
+    for (const QLineEdit* edit : {view->_classCount, view->_appletCount, view->_extClassCount, view->_notifierCount,
+                                  view->_mimeTypeCount})
+        counts << edit->text();
+    if (!counts.join(QString()).isEmpty())
+        lines << "counts: " + counts.join('|');
+    for (const QTableWidget* table : {view->_classIDTable, view->_appletTable, view->_externalClassesTable,
+                                      view->_notifiersTable, view->_mimeTypeTable}) {
+        for (int row = 0; row < table->rowCount(); ++row) {
+            QStringList cells;
+            for (int column = 0; column < table->columnCount(); ++column) {
+                const QTableWidgetItem* item = table->item(row, column);
+                const bool right = item && (item->textAlignment() & Qt::AlignRight);
+                cells << (right ? ">" : "") + (item ? item->text() : "<none>");
+            }
+            lines << table->objectName() + ": " + cells.join('|');
+        }
+    }
+    return lines;
+}
+
+QList<ModuleInfoDialog*> openDialogs()
+{
+    QList<ModuleInfoDialog*> dialogs;
+    for (QWidget* widget : QApplication::topLevelWidgets()) {
+        if (auto* dialog = qobject_cast<ModuleInfoDialog*>(widget))
+            dialogs << dialog;
+    }
+    return dialogs;
+}
+
+// A MIF container without the module header resource.
+QByteArray containerWithoutModule()
+{
+    MifWriter writer;
+    writer.addResource(0x4000, 1, "something else");
+    return writer.data();
+}
+
+// Records the files the window hands to the desktop.
+class DesktopSpy : public QObject
+{
+    Q_OBJECT
+public:
+    QList<QUrl> opened;
+public slots:
+    void open(const QUrl& url) { opened << url; }
+};
+
+} // namespace
+
+// The module information view and dialog, alone and reached from a device window: what
+// they show of an entry, where it comes from, its export, and where the dialogs open.
+class ModuleInfoDialogTest : public QObject
+{
+    Q_OBJECT
+
+    QTemporaryDir m_sockets;
+    QTemporaryDir m_files;
+    TestImage m_image;
+    SimulatorProcess m_simulator{m_sockets.path()};
+    QList<QPointer<DeviceWindow>> m_windows;
+
+    DeviceWindow* openWindow()
+    {
+        auto* window = new DeviceWindow;
+        m_windows << window;
+        window->setDevice(DeviceId);
+        window->show();
+        return window;
+    }
+
+private slots:
+    void initTestCase()
+    {
+        Q_INIT_RESOURCE(delvix);
+        QCoreApplication::setOrganizationName("Norvale");
+        QCoreApplication::setApplicationName("Delvix");
+        const QByteArray odd = MifWriter::moduleData(oddModule());
+        QVERIFY(TestSupport::writeFile(m_files.filePath("odd.mif"), odd));
+        QVERIFY(TestSupport::writeFile(m_files.filePath("empty.mif"), containerWithoutModule()));
+        QVERIFY(TestSupport::writeFile(m_files.filePath("garbage.mif"), "not a resource container at all"));
+
+        m_image.fillDefault();
+        m_image.writeFile("flash/usermod/odd/odd.mif", odd);
+        for (const char* name : {"copy.mif", "UPPER.MIF", "copy.mif.bak", "archive.old.mif"})
+            m_image.writeFile(QStringLiteral("flash/shared/") + name, odd);
+        qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_sockets.path()));
+        Portlex::Initialize();
+        QVERIFY(m_simulator.connectDevice(m_image.path(), DeviceId));
+    }
+    void init() { QSettings().remove("ModuleInfoDialog"); }
+    void cleanup()
+    {
+        qDeleteAll(m_windows);
+        m_windows.clear();
+        qDeleteAll(openDialogs());
+    }
+
+    // The same module given as an entry, read from a MIF file on disk, or asked of the device.
+    void showsTheModule_data()
+    {
+        QTest::addColumn<QString>("source");
+        QTest::addColumn<QString>("title");
+        QTest::newRow("entry") << "entry" << "Module Info";
+        QTest::newRow("MIF file on disk") << "file" << "Module Info odd";
+        QTest::newRow("device module") << "device" << "Module Info odd";
+    }
+    void showsTheModule()
+    {
+        QFETCH(QString, source);
+        QFETCH(QString, title);
+        ModuleInfoDialog dialog;
+        if (source == "entry") {
+            QVERIFY(dialog._moduleInfoView->setMifEntry(oddModule()));
+        } else if (source == "file") {
+            dialog.openMifFile(m_files.filePath("odd.mif"), "odd");
+        } else {
+            ModuleInfo module;
+            module.name = "odd";
+            module.path = OddModulePath;
+            dialog.openDeviceModule(DeviceId, module);
+        }
+        QCOMPARE(dialog.windowTitle(), title);
+        QCOMPARE(viewLines(dialog._moduleInfoView), OddModuleLines);
+        QCOMPARE(dialog._moduleInfoView->mifEntryXml(), OddModuleXml);
+    }
+
+    // A later entry replaces every row of the earlier one.
+    void refreshStartsFromScratch()
+    {
+        ModuleInfoView view;
+        view.setMifEntry(oddModule());
+        MifEntry other;
+        other.classes = {Stranger};
+        other.classCount = 1;
+        view.setMifEntry(other);
+        QCOMPARE(viewLines(&view), QStringList({"counts: 1|0|0|0|0", "_classIDTable: not found|0x7E000001|unknown|unknown"}));
+    }
+
+    // Nothing to show leaves the view empty, without a message; the title still names the module.
+    void failuresLeaveTheViewEmpty_data()
+    {
+        QTest::addColumn<QString>("device");  // none: a file on disk
+        QTest::addColumn<QString>("path");
+        QTest::newRow("missing file") << "" << m_files.filePath("missing.mif");
+        QTest::newRow("not a MIF") << "" << m_files.filePath("garbage.mif");
+        QTest::newRow("MIF without a module") << "" << m_files.filePath("empty.mif");
+        QTest::newRow("unknown device") << "nobody" << OddModulePath;
+        QTest::newRow("module the device lacks") << DeviceId << "/usermod/none/none.mif";
+    }
+    void failuresLeaveTheViewEmpty()
+    {
+        QFETCH(QString, device);
+        QFETCH(QString, path);
+        ModuleInfoDialog dialog;
+        if (device.isEmpty()) {
+            dialog.openMifFile(path, "odd");
+        } else {
+            ModuleInfo module;
+            module.name = "odd";
+            module.path = path;
+            dialog.openDeviceModule(device, module);
+        }
+        QCOMPARE(dialog.windowTitle(), QString("Module Info odd"));
+        QCOMPARE(viewLines(dialog._moduleInfoView), QStringList());
+    }
+
+    // Only a file that cannot be read is refused; one without a module is read, showing nothing.
+    void loadingTellsWhetherTheFileWasRead_data()
+    {
+        QTest::addColumn<QString>("name");
+        QTest::addColumn<bool>("read");
+        QTest::newRow("module") << "odd.mif" << true;
+        QTest::newRow("without a module") << "empty.mif" << true;
+        QTest::newRow("missing") << "missing.mif" << false;
+        QTest::newRow("not a MIF") << "garbage.mif" << false;
+    }
+    void loadingTellsWhetherTheFileWasRead()
+    {
+        QFETCH(QString, name);
+        QFETCH(bool, read);
+        ModuleInfoView view;
+        MifEntry shown;
+        shown.classes = {Stranger};
+        shown.classCount = 1;
+        view.setMifEntry(shown);
+        const QStringList before = viewLines(&view);
+        QCOMPARE(view.loadMifFile(m_files.filePath(name)), read);
+        if (!read)
+            QCOMPARE(viewLines(&view), before);
+    }
+
+    // Sections come in a fixed order and an empty list leaves its section out; the five
+    // counts are always written, as stored.
+    void exportSections_data()
+    {
+        QTest::addColumn<MifEntry>("entry");
+        QTest::addColumn<QStringList>("sections");
+        const MifEntry full = oddModule();
+        MifEntry none;
+        none.classCount = 3;
+        none.mimeTypeCount = 2;
+        MifEntry ends = none;
+        ends.classes = full.classes;
+        ends.mimeTypes = full.mimeTypes;
+        MifEntry middle = none;
+        middle.applets = full.applets;
+        middle.notifiers = full.notifiers;
+        MifEntry external = none;
+        external.externalClasses = full.externalClasses;
+        QTest::newRow("all five") << full << QStringList{"classes", "applets", "externalClasses", "notifiers", "mimetypes"};
+        QTest::newRow("all empty") << none << QStringList();
+        QTest::newRow("first and last") << ends << QStringList{"classes", "mimetypes"};
+        QTest::newRow("applets and notifiers") << middle << QStringList{"applets", "notifiers"};
+        QTest::newRow("external classes") << external << QStringList{"externalClasses"};
+    }
+    void exportSections()
+    {
+        QFETCH(MifEntry, entry);
+        QFETCH(QStringList, sections);
+        ModuleInfoView view;
+        view.setMifEntry(entry);
+        const QString xml = view.mifEntryXml();
+        QVERIFY(xml.startsWith("<!DOCTYPE zant-mif-entry>\n<mifEntry "));
+        QDomDocument document;
+        QVERIFY(document.setContent(xml));
+        const QDomElement root = document.documentElement();
+        const QStringList counts = {root.attribute("classCount"), root.attribute("appletCount"),
+                                    root.attribute("extClassCount"), root.attribute("notificationCount"),
+                                    root.attribute("mimeTypeCount")};
+        QCOMPARE(counts, QStringList({QString::number(entry.classCount), QString::number(entry.appletCount),
+                                      QString::number(entry.externalClassCount),
+                                      QString::number(entry.notificationCount), QString::number(entry.mimeTypeCount)}));
+        QStringList children;
+        for (QDomElement e = root.firstChildElement(); !e.isNull(); e = e.nextSiblingElement())
+            children << e.tagName();
+        QCOMPARE(children, sections);
+    }
+
+    // "Save Module Info..." offers the module's name with ".xml" and writes the export unchanged.
+    void savesTheExport()
+    {
+        QTemporaryDir folder;
+        QString caption;
+        saveXmlReportDialogs().askFileName = [&](QWidget*, const QString& asked, const QString&, const QString&) {
+            caption = asked;
+            return folder.filePath("saved.xml");
+        };
+        ModuleInfoDialog dialog;
+        dialog.show();
+        dialog.openMifFile(m_files.filePath("odd.mif"), "odd");
+        dialog._saveModInfoButton->click();
+        saveXmlReportDialogs().askFileName = nullptr;
+        QCOMPARE(caption, QString("Save fileodd.xml"));
+        QCOMPARE(TestSupport::readFile(folder.filePath("saved.xml")), OddModuleXml.toLocal8Bit());
+        QVERIFY(dialog.isVisible());
+    }
+
+    // Each dialog opens 20 pixels right and down from where the last one closed, and stays on a screen.
+    void placement_data()
+    {
+        QTest::addColumn<QVariant>("storedPos");
+        QTest::addColumn<QVariant>("storedSize");
+        QTest::addColumn<QPoint>("pos");
+        QTest::addColumn<QSize>("size");
+        QTest::newRow("first ever") << QVariant() << QVariant() << QPoint(120, 120) << QSize(600, 350);
+        QTest::newRow("stored") << QVariant(QPoint(300, 200)) << QVariant(QSize(500, 300)) << QPoint(320, 220)
+                                << QSize(500, 300);
+        QTest::newRow("off every screen") << QVariant(QPoint(9000, 9000)) << QVariant(QSize(500, 300)) << QPoint(40, 40)
+                                          << QSize(500, 300);
+    }
+    void placement()
+    {
+        QFETCH(QVariant, storedPos);
+        QFETCH(QVariant, storedSize);
+        QFETCH(QPoint, pos);
+        QFETCH(QSize, size);
+        if (storedPos.isValid()) {
+            QSettings settings;
+            settings.setValue("ModuleInfoDialog/pos", storedPos);
+            settings.setValue("ModuleInfoDialog/size", storedSize);
+        }
+        ModuleInfoDialog dialog;
+        QCOMPARE(dialog.pos(), pos);
+        QCOMPARE(dialog.size(), size);
+    }
+
+    // However it is closed, a dialog goes and leaves its place to the next one.
+    void cascadesFromTheLastClosed_data()
+    {
+        QTest::addColumn<QString>("how");
+        QTest::newRow("Close") << "Close";
+        QTest::newRow("Escape") << "Escape";
+        QTest::newRow("window closed") << "window";
+    }
+    void cascadesFromTheLastClosed()
+    {
+        QFETCH(QString, how);
+        QPointer<ModuleInfoDialog> first = new ModuleInfoDialog;
+        first->show();
+        first->move(200, 150);
+        first->resize(520, 310);
+        if (how == "Close")
+            first->okButton->click();
+        else if (how == "Escape")
+            QTest::keyClick(first, Qt::Key_Escape);
+        else
+            first->close();
+        QTRY_VERIFY(first.isNull());
+        ModuleInfoDialog second;
+        QCOMPARE(second.pos(), QPoint(220, 170));
+        QCOMPARE(second.size(), QSize(520, 310));
+    }
+
+    // A double-click in the device window's module list opens the module's own information.
+    void moduleListDoubleClickOpensTheModule()
+    {
+        DeviceWindow* window = openWindow();
+        window->action_Modules->trigger();
+        QTableWidget* table = window->_moduleListView->_moduleTable;
+        QTRY_VERIFY_WITH_TIMEOUT(window->_moduleListView->isComplete(), 20000);
+        const QList<QTableWidgetItem*> found = table->findItems("odd", Qt::MatchExactly);
+        QCOMPARE(found.size(), 1);
+        table->scrollToItem(found.first());
+        // Through the window, as the platform delivers it: a widget-level double-click is never
+        // paired with its press.
+        const QPoint centre = table->visualItemRect(found.first()).center();
+        QTest::mouseDClick(window->windowHandle(), Qt::LeftButton, {}, table->viewport()->mapTo(window, centre));
+
+        const QList<ModuleInfoDialog*> dialogs = openDialogs();
+        QCOMPARE(dialogs.size(), 1);
+        ModuleInfoDialog* dialog = dialogs.first();
+        QVERIFY(dialog->isVisible() && !dialog->isModal() && !dialog->parent() && dialog->isSizeGripEnabled());
+        QCOMPARE(dialog->windowTitle(), QString("Module Info odd"));
+        QCOMPARE(viewLines(dialog->_moduleInfoView), OddModuleLines);
+    }
+
+    // A device file whose complete suffix is "mif", in any case, opens as module information
+    // from its copy on the PC; any other goes to the desktop.
+    void deviceFileOpensAsModuleInfo_data()
+    {
+        QTest::addColumn<QString>("name");
+        QTest::addColumn<QString>("title");
+        QTest::newRow("mif") << "copy.mif" << "Module Info copy";
+        QTest::newRow("MIF") << "UPPER.MIF" << "Module Info UPPER";
+        QTest::newRow("further suffix") << "copy.mif.bak" << "";
+        QTest::newRow("two suffixes") << "archive.old.mif" << "";
+    }
+    void deviceFileOpensAsModuleInfo()
+    {
+        QFETCH(QString, name);
+        QFETCH(QString, title);
+        QTemporaryDir temporary;
+        const QByteArray previous = qgetenv("TMPDIR");
+        qputenv("TMPDIR", QFile::encodeName(temporary.path()));
+        DesktopSpy desktop;
+        QDesktopServices::setUrlHandler("file", &desktop, "open");
+        openWindow()->onFileSystemDoubleClick("/shared/" + name);
+        QDesktopServices::unsetUrlHandler("file");
+        qputenv("TMPDIR", previous);
+
+        const QString local = temporary.filePath(name);
+        QCOMPARE(TestSupport::readFile(local), MifWriter::moduleData(oddModule()));
+        const QList<ModuleInfoDialog*> dialogs = openDialogs();
+        if (title.isEmpty()) {
+            QCOMPARE(dialogs.size(), 0);
+            QCOMPARE(desktop.opened, QList<QUrl>({QUrl::fromLocalFile(local)}));
+            return;
+        }
+        QCOMPARE(desktop.opened, QList<QUrl>());
+        QCOMPARE(dialogs.size(), 1);
+        QVERIFY(dialogs.first()->isVisible() && !dialogs.first()->parent() && dialogs.first()->isSizeGripEnabled());
+        QCOMPARE(dialogs.first()->windowTitle(), title);
+        QCOMPARE(viewLines(dialogs.first()->_moduleInfoView), OddModuleLines);
+    }
+};
+
+QTEST_MAIN(ModuleInfoDialogTest)
+#include "tst_moduleinfodialog.moc"
