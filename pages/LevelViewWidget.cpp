@@ -10,6 +10,8 @@
 
 #include <QFileInfo>
 
+#include <algorithm>
+
 namespace {
 
 enum Column
@@ -36,11 +38,31 @@ LevelViewWidget::LevelViewWidget(QWidget* parent)
 
 void LevelViewWidget::setDeviceRecord(DeviceCache* record)
 {
+    QStringList files;
+    if (record)
+        listLevelFiles(files);
+    offerLevelFiles(record, files);
+}
+
+void LevelViewWidget::setDeviceRecord(DeviceCache* record, const QString& levelsDirectory)
+{
+    QStringList files;
+    if (record)
+        listLevelFiles(levelsDirectory, files);
+    offerLevelFiles(record, files);
+}
+
+void LevelViewWidget::offerLevelFiles(DeviceCache* record, QStringList files)
+{
     m_record = record;
     if (!record)
         return;
-    QStringList files;
-    listLevelFiles(files);
+    // A folder listing has no useful order of its own; the files share their folder, so the
+    // paths sort as the names do.
+    std::sort(files.begin(), files.end(), [](const QString& a, const QString& b) {
+        const int order = a.compare(b, Qt::CaseInsensitive);
+        return order != 0 ? order < 0 : a < b;
+    });
     for (const QString& file : std::as_const(files)) {
         const QFileInfo info(file);
         _levelDocuments->addItem(info.baseName(), info.absoluteFilePath());
@@ -109,6 +131,8 @@ void LevelViewWidget::onCurrentLevelChanged(int index)
     for (int column = FamilyColumn; column <= IdColumn; ++column)
         _level1Tree->resizeColumnToContents(column);
     _level1Tree->setUpdatesEnabled(true);
+    // The export follows the level shown, whatever an earlier export built.
+    m_report.clear();
     setStatus(readyStatus());
     setState(Complete);
 }

@@ -16,9 +16,11 @@ class LevelViewWidget : public GatewayComponentWidget, public Ui::LevelViewWidge
 public:
     explicit LevelViewWidget(QWidget* parent = nullptr);
 
-    // Offers the level files for record's device (the record stays the device's); null
-    // offers nothing.
+    // Offers the level files for record's device (the record stays the device's), sorted by
+    // name; null offers nothing. The files are those of the "Levels" folder beside the
+    // program, or of levelsDirectory.
     void setDeviceRecord(DeviceCache* record);
+    void setDeviceRecord(DeviceCache* record, const QString& levelsDirectory);
 
 public slots:
     QString componentName() override;
@@ -33,6 +35,7 @@ public slots:
     void onCurrentLevelChanged(int index);
 
 private:
+    void offerLevelFiles(DeviceCache* record, QStringList files);
     void insertEntry(const IdRecord& entry);
 
     DeviceCache* m_record = nullptr;

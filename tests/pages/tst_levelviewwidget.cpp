@@ -1,54 +1,29 @@
 #include "LevelFiles.h"
 #include "LevelViewWidget.h"
-#include "TreePageFixtures.h"
+#include "PageFixtures.h"
+#include "TestSupport.h"
 
 #include <QFileInfo>
 #include <QSignalSpy>
 #include <QTemporaryDir>
-#include <QTest>
 
-using namespace TreePageFixtures;
+using namespace PageFixtures;
 
 namespace {
 
 // Classes of a small device: two families, one class unavailable.
 DeviceCache smallDevice()
 {
-    return cacheOf({makeClass("0x01000001", "Player", "Media", "Audio"),
-                    makeClass("0x01000002", "Camera", "media", "Video"),
-                    makeClass("0x01000003", "Mixer", "Media", "audio", false),
-                    makeClass("0x0100000A", "Heap", "Kernel", "Memory")});
+    return cacheOf({makeClass("0x01000001", "Player", "Media", "Audio"), makeClass("0x01000002", "Camera", "media", "Video"),
+                    makeClass("0x01000003", "Mixer", "Media", "audio", false), makeClass("0x0100000A", "Heap", "Kernel", "Memory")});
 }
 
-const char* const SmallLevel = R"(<?xml version="1.0"?>
-<level name="small">
-  <Id value="0x01000002" name="Camera"/>
-  <Id value="0x01000001" name="Player"/>
-  <Other value="0x01000001" name="Skipped"/>
-  <Id value="0x01000003" name="Mixer"/>
-  <Id value="0x0100000a" name="FromFile"/>
-  <Id value="0x01000099" name="Missing"/>
-  <Id value="0x01000098" name="AlsoMissing"/>
-</level>
-)";
-
-// The small level against the small device: families sorted, the rest in file order.
-const QStringList SmallLevelTree = {
-    "||||",
-    " ||||",
-    "  ||Missing|0x01000099|Not Found",
-    "  ||AlsoMissing|0x01000098|Not Found",
-    "Kernel||||",
-    " |Memory|||",
-    "  ||FromFile|0x0100000A|Found",
-    "media||||",
-    " |Video|||",
-    "  ||Camera|0x01000002|Found",
-    " |Audio|||",
-    "  ||Player|0x01000001|Found",
-    " |audio|||",
-    "  ||Mixer|0x01000003|Not Found",
-};
+// Adds path as a choice and chooses it, as the user does from the combo box.
+void choose(LevelViewWidget& page, const QString& path)
+{
+    page._levelDocuments->addItem(QFileInfo(path).baseName(), path);
+    page._levelDocuments->setCurrentIndex(page._levelDocuments->count() - 1);
+}
 
 } // namespace
 
@@ -61,241 +36,180 @@ class TestLevelViewWidget : public QObject
 private slots:
     void initTestCase()
     {
-        QVERIFY(m_folder.isValid());
-        qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_folder.path()));
-        QVERIFY(Portlex::Initialize());
-        m_smallLevel = writeFile("small.xml", SmallLevel);
-        QVERIFY(!writeFile("broken.xml", "<level><Id value=\"0x01000001\"").isEmpty());
+        m_small = m_folder.filePath("small.xml");
+        QVERIFY(TestSupport::writeFile(m_small, R"(<level name="small">
+  <Id value="0x01000002" name="Camera"/>
+  <Id value="0x01000001" name="Player"/>
+  <Id value="0x01000003" name="Mixer"/>
+  <Id value="0x0100000a" name="FromFile"/>
+  <Id value="0x01000099" name="Missing"/>
+  <Id value="0x01000098" name="AlsoMissing"/>
+</level>
+)"));
     }
 
-    void cleanupTestCase()
+    // Sorted by name whatever order the folder lists them in (created here neither sorted
+    // nor in reverse), letter case aside.
+    void offersTheLevelFilesSorted()
     {
-        Portlex::Destroy();
-    }
-
-    void startsCompleteWithThePrompt()
-    {
-        LevelViewWidget page;
-        QCOMPARE(page.status(), QString("Ready"));
-        QCOMPARE(page.state(), GatewayComponentWidget::Complete);
-        QVERIFY(page.isComplete());
-        QVERIFY(page.canSearch());
-        QCOMPARE(page.componentName(), QString("LevelView"));
-        QCOMPARE(page._levelDocuments->count(), 1);
-        QCOMPARE(page._levelDocuments->itemText(0), QString("Select a level to begin"));
-        QVERIFY(!page._levelDocuments->itemData(0).isValid());
-
-        page.setDeviceRecord(nullptr);
-        QCOMPARE(page._levelDocuments->count(), 1);
-    }
-
-    void offersTheLevelFiles()
-    {
-        QStringList files;
-        listLevelFiles(files);
-        QVERIFY(files.size() >= 2); // the shipped levels beside the program
-
+        QTemporaryDir levels;
+        const QStringList created = {"b-level.xml", "C.xml.bak", "a-level.xml", "Alpha.xml", "notes.txt"};
+        for (const QString& name : created)
+            QVERIFY(TestSupport::writeFile(levels.filePath(name), "<level/>"));
         DeviceCache cache = smallDevice();
         LevelViewWidget page;
         QSignalSpy states(&page, &GatewayComponentWidget::stateChanged);
-        page.setDeviceRecord(&cache);
-        QCOMPARE(page._levelDocuments->count(), files.size() + 1);
-        for (int i = 0; i < files.size(); ++i) {
-            const QFileInfo info(files.at(i));
-            QCOMPARE(page._levelDocuments->itemText(i + 1), info.baseName());
-            QCOMPARE(page._levelDocuments->itemData(i + 1).toString(), info.absoluteFilePath());
+        page.setDeviceRecord(nullptr, levels.path());
+        QCOMPARE(page._levelDocuments->count(), 1);
+        page.setDeviceRecord(&cache, levels.path());
+        QStringList texts, paths;
+        for (int i = 1; i < page._levelDocuments->count(); ++i) {
+            texts << page._levelDocuments->itemText(i);
+            paths << page._levelDocuments->itemData(i).toString();
         }
+        QCOMPARE(texts, QStringList({"a-level", "Alpha", "b-level", "C"}));
+        QCOMPARE(paths, QStringList({levels.filePath("a-level.xml"), levels.filePath("Alpha.xml"),
+                                     levels.filePath("b-level.xml"), levels.filePath("C.xml.bak")}));
         // Offering is not choosing.
         QCOMPARE(page._levelDocuments->currentIndex(), 0);
         QCOMPARE(states.count(), 0);
     }
 
+    // Without a folder, the levels beside the program are offered.
+    void offersTheShippedLevels()
+    {
+        QStringList files;
+        listLevelFiles(files);
+        QVERIFY(files.size() >= 2);
+        files.sort(Qt::CaseInsensitive);
+        DeviceCache cache = smallDevice();
+        LevelViewWidget page;
+        page.setDeviceRecord(&cache);
+        QStringList paths;
+        for (int i = 1; i < page._levelDocuments->count(); ++i)
+            paths << page._levelDocuments->itemData(i).toString();
+        QCOMPARE(paths, files);
+    }
+
+    // Families sorted, the rest in file order, every branch open; the export shows it.
     void checksALevelAgainstTheClasses()
     {
         DeviceCache cache = smallDevice();
         LevelViewWidget page;
         page.setDeviceRecord(&cache);
-        QSignalSpy states(&page, &GatewayComponentWidget::stateChanged);
         QSignalSpy statuses(&page, &GatewayComponentWidget::statusChanged);
-        choose(page, m_smallLevel);
-
-        QCOMPARE(treeLines(page._level1Tree), SmallLevelTree);
-        QCOMPARE(statuses.count(), 2);
-        QCOMPARE(statuses.at(0).at(0).toString(), QString("Processing"));
-        QCOMPARE(statuses.at(1).at(0).toString(), QString("Ready"));
-        QCOMPARE(states.count(), 2);
+        choose(page, m_small);
+        QCOMPARE(signalTexts(statuses), QStringList({"Processing", "Ready"}));
         QCOMPARE(page.state(), GatewayComponentWidget::Complete);
-
-        QTreeWidget* tree = page._level1Tree;
-        QTreeWidgetItemIterator it(tree);
-        int classes = 0;
-        for (; *it; ++it) {
-            QTreeWidgetItem* item = *it;
-            if (item->childCount() > 0) {
-                QVERIFY2(item->isExpanded(), qPrintable(item->text(0) + item->text(1)));
-                continue;
-            }
-            ++classes;
-            const bool found = item->text(4) == "Found";
-            QVERIFY(found || item->text(4) == "Not Found");
-            QCOMPARE(item->foreground(4).color(), QColor(found ? Qt::green : Qt::red));
-        }
-        QCOMPARE(classes, 6);
+        for (QTreeWidgetItemIterator it(page._level1Tree, QTreeWidgetItemIterator::HasChildren); *it; ++it)
+            QVERIFY((*it)->isExpanded());
+        QCOMPARE(page.xmlReport(), QString("<!DOCTYPE levelreport>\n"
+                                           "<device>\n"
+                                           " <family name=\"\">\n"
+                                           "  <subfamily name=\"\">\n"
+                                           "   <class name=\"Missing\" classid=\"0x01000099\" available=\"Not Found\"/>\n"
+                                           "   <class name=\"AlsoMissing\" classid=\"0x01000098\" available=\"Not Found\"/>\n"
+                                           "  </subfamily>\n"
+                                           " </family>\n"
+                                           " <family name=\"Kernel\">\n"
+                                           "  <subfamily name=\"Memory\">\n"
+                                           "   <class name=\"FromFile\" classid=\"0x0100000A\" available=\"Found\"/>\n"
+                                           "  </subfamily>\n"
+                                           " </family>\n"
+                                           " <family name=\"media\">\n"
+                                           "  <subfamily name=\"Video\">\n"
+                                           "   <class name=\"Camera\" classid=\"0x01000002\" available=\"Found\"/>\n"
+                                           "  </subfamily>\n"
+                                           "  <subfamily name=\"Audio\">\n"
+                                           "   <class name=\"Player\" classid=\"0x01000001\" available=\"Found\"/>\n"
+                                           "  </subfamily>\n"
+                                           "  <subfamily name=\"audio\">\n"
+                                           "   <class name=\"Mixer\" classid=\"0x01000003\" available=\"Not Found\"/>\n"
+                                           "  </subfamily>\n"
+                                           " </family>\n"
+                                           "</device>\n"));
     }
 
-    void promptAfterALevelKeepsTheTree()
+    // An export taken before a choice, or of an earlier level, never stands for the level shown.
+    void exportFollowsTheLevelShown()
     {
+        const QString first = m_folder.filePath("first.xml");
+        const QString second = m_folder.filePath("second.xml");
+        QVERIFY(TestSupport::writeFile(first, R"(<level><Id value="0x01000001" name="Player"/></level>)"));
+        QVERIFY(TestSupport::writeFile(second, R"(<level><Id value="0x01000099" name="Missing"/></level>)"));
         DeviceCache cache = smallDevice();
         LevelViewWidget page;
         page.setDeviceRecord(&cache);
-        choose(page, m_smallLevel);
-        page._levelDocuments->setCurrentIndex(0);
-        QCOMPARE(page.status(), QString("Processing"));
-        QCOMPARE(page.state(), GatewayComponentWidget::Processing);
-        QVERIFY(!page.canSearch());
-        QVERIFY(!page.isComplete());
-        QCOMPARE(treeLines(page._level1Tree), SmallLevelTree);
+        QCOMPARE(page.xmlReport(), QString("<!DOCTYPE levelreport>\n<device/>\n"));
+
+        choose(page, first);
+        const QString firstReport = page.xmlReport();
+        QCOMPARE(firstReport, QString("<!DOCTYPE levelreport>\n"
+                                      "<device>\n"
+                                      " <family name=\"Media\">\n"
+                                      "  <subfamily name=\"Audio\">\n"
+                                      "   <class name=\"Player\" classid=\"0x01000001\" available=\"Found\"/>\n"
+                                      "  </subfamily>\n"
+                                      " </family>\n"
+                                      "</device>\n"));
+        choose(page, second);
+        const QString secondReport = page.xmlReport();
+        QVERIFY(secondReport != firstReport);
+        QCOMPARE(secondReport, QString("<!DOCTYPE levelreport>\n"
+                                       "<device>\n"
+                                       " <family name=\"\">\n"
+                                       "  <subfamily name=\"\">\n"
+                                       "   <class name=\"Missing\" classid=\"0x01000099\" available=\"Not Found\"/>\n"
+                                       "  </subfamily>\n"
+                                       " </family>\n"
+                                       "</device>\n"));
+        // A level that cannot be read keeps the tree, and the export with it.
+        choose(page, m_folder.filePath("missing.xml"));
+        QCOMPARE(page.xmlReport(), secondReport);
     }
 
-    void unreadableLevelKeepsTheTree_data()
+    // Going back to the prompt, or choosing a level that cannot be read, keeps the tree.
+    void laterChoiceKeepsTheTree_data()
     {
         QTest::addColumn<QString>("path");
-        QTest::newRow("missing file") << "missing.xml";
-        QTest::newRow("malformed file") << "broken.xml";
-        QTest::newRow("a folder") << ".";
+        QTest::addColumn<QString>("status");
+        QTest::addColumn<GatewayComponentWidget::ComponentState>("state");
+        QTest::newRow("prompt") << "" << "Processing" << GatewayComponentWidget::Processing;
+        QTest::newRow("unreadable") << "missing.xml" << "Level file not found" << GatewayComponentWidget::Failed;
     }
 
-    void unreadableLevelKeepsTheTree()
+    void laterChoiceKeepsTheTree()
     {
         QFETCH(QString, path);
+        QFETCH(QString, status);
+        QFETCH(GatewayComponentWidget::ComponentState, state);
         DeviceCache cache = smallDevice();
         LevelViewWidget page;
         page.setDeviceRecord(&cache);
-        choose(page, m_smallLevel);
-        choose(page, QDir(m_folder.path()).filePath(path));
-        QCOMPARE(page.status(), QString("Level file not found"));
-        QCOMPARE(page.state(), GatewayComponentWidget::Failed);
-        QVERIFY(!page.isComplete());
-        QCOMPARE(treeLines(page._level1Tree), SmallLevelTree);
+        choose(page, m_small);
+        const QStringList tree = treeLines(page._level1Tree);
+        QVERIFY(!tree.isEmpty());
+        if (path.isEmpty())
+            page._levelDocuments->setCurrentIndex(0);
+        else
+            choose(page, m_folder.filePath(path));
+        QCOMPARE(page.status(), status);
+        QCOMPARE(page.state(), state);
+        QVERIFY(!page.isComplete() && !page.canSearch());
+        QCOMPARE(treeLines(page._level1Tree), tree);
     }
 
     void choiceBeforeTheRecordStaysProcessing()
     {
         LevelViewWidget page;
-        choose(page, m_smallLevel);
+        choose(page, m_small);
         QCOMPARE(page.status(), QString("Processing"));
-        QCOMPARE(page.state(), GatewayComponentWidget::Processing);
         QCOMPARE(page._level1Tree->topLevelItemCount(), 0);
     }
 
-    void searchesTheTree()
-    {
-        DeviceCache cache = smallDevice();
-        LevelViewWidget page;
-        page.setDeviceRecord(&cache);
-        choose(page, m_smallLevel);
-        page._level1Tree->collapseAll();
-
-        QVERIFY(page.search("not found"));
-        QStringList hits;
-        for (const QTreeWidgetItem* item : page._level1Tree->selectedItems())
-            hits.append(item->text(2));
-        hits.sort();
-        QCOMPARE(hits, QStringList({"AlsoMissing", "Missing", "Mixer"}));
-        QVERIFY(!page.search("no"));
-        QVERIFY(page._level1Tree->selectedItems().isEmpty());
-    }
-
-    void reportIsFrozenAtItsFirstCall()
-    {
-        DeviceCache cache = smallDevice();
-        LevelViewWidget page;
-        page.setDeviceRecord(&cache);
-        const QString empty = "<!DOCTYPE levelreport>\n<device/>\n";
-        QCOMPARE(page.xmlReport(), empty);
-        choose(page, m_smallLevel);
-        QCOMPARE(page.xmlReport(), empty);
-    }
-
-    void reportOfALevel()
-    {
-        DeviceCache cache = smallDevice();
-        LevelViewWidget page;
-        page.setDeviceRecord(&cache);
-        choose(page, m_smallLevel);
-        const QString expected = "<!DOCTYPE levelreport>\n"
-                                 "<device>\n"
-                                 " <family name=\"\">\n"
-                                 "  <subfamily name=\"\">\n"
-                                 "   <class name=\"Missing\" classid=\"0x01000099\" available=\"Not Found\"/>\n"
-                                 "   <class name=\"AlsoMissing\" classid=\"0x01000098\" available=\"Not Found\"/>\n"
-                                 "  </subfamily>\n"
-                                 " </family>\n"
-                                 " <family name=\"Kernel\">\n"
-                                 "  <subfamily name=\"Memory\">\n"
-                                 "   <class name=\"FromFile\" classid=\"0x0100000A\" available=\"Found\"/>\n"
-                                 "  </subfamily>\n"
-                                 " </family>\n"
-                                 " <family name=\"media\">\n"
-                                 "  <subfamily name=\"Video\">\n"
-                                 "   <class name=\"Camera\" classid=\"0x01000002\" available=\"Found\"/>\n"
-                                 "  </subfamily>\n"
-                                 "  <subfamily name=\"Audio\">\n"
-                                 "   <class name=\"Player\" classid=\"0x01000001\" available=\"Found\"/>\n"
-                                 "  </subfamily>\n"
-                                 "  <subfamily name=\"audio\">\n"
-                                 "   <class name=\"Mixer\" classid=\"0x01000003\" available=\"Not Found\"/>\n"
-                                 "  </subfamily>\n"
-                                 " </family>\n"
-                                 "</device>\n";
-        QCOMPARE(page.xmlReport(), expected);
-    }
-
-    void simulatorSampleAgainstLevelTwo()
-    {
-        SimulatorProcess simulator(m_folder.path());
-        const QSharedPointer<_ZantDevice> device = connectSample(simulator, "simulator", "aurora");
-        QVERIFY(device);
-
-        LevelViewWidget page;
-        page.setDeviceRecord(&device->cache);
-        const int index = page._levelDocuments->findText("Level-2");
-        QVERIFY(index > 0);
-        page._levelDocuments->setCurrentIndex(index);
-        QCOMPARE(page.status(), QString("Ready"));
-
-        int found = 0;
-        int missing = 0;
-        for (QTreeWidgetItemIterator it(page._level1Tree, QTreeWidgetItemIterator::NoChildren); *it; ++it) {
-            const bool available = device->cache.classes.value((*it)->text(3)).available;
-            QCOMPARE((*it)->text(4), QString(available ? "Found" : "Not Found"));
-            (available ? found : missing)++;
-        }
-        // The sample lacks some level-2 classes.
-        QVERIFY(found > 0);
-        QVERIFY(missing > 0);
-        QVERIFY(matchesExpected("levelreport-simulator-Level-2.0.xml", page.xmlReport()));
-    }
-
 private:
-    QString writeFile(const QString& name, const QByteArray& text)
-    {
-        QFile file(QDir(m_folder.path()).filePath(name));
-        if (!file.open(QIODevice::WriteOnly))
-            return QString();
-        file.write(text);
-        return file.fileName();
-    }
-
-    // Adds path as a choice and chooses it, as the user does from the combo box.
-    static void choose(LevelViewWidget& page, const QString& path)
-    {
-        page._levelDocuments->addItem(QFileInfo(path).baseName(), path);
-        page._levelDocuments->setCurrentIndex(page._levelDocuments->count() - 1);
-    }
-
     QTemporaryDir m_folder;
-    QString m_smallLevel;
+    QString m_small;
 };
 
 QTEST_MAIN(TestLevelViewWidget)
