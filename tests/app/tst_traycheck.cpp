@@ -9,19 +9,17 @@ class TrayCheckTest : public QObject
     Q_OBJECT
 
 private slots:
-    void withoutTrayEndsWithCodeOne();
+    void withoutTrayEndsWithCodeOne()
+    {
+        QProcess delvix;
+        delvix.start(QCoreApplication::applicationDirPath() + "/delvix");
+        QVERIFY(delvix.waitForStarted());
+        QVERIFY(DesktopDriver::pressKeysIn("^Systray$", {"Return"}));
+        QVERIFY(delvix.waitForFinished(15000));
+        QCOMPARE(delvix.exitStatus(), QProcess::NormalExit);
+        QCOMPARE(delvix.exitCode(), 1);
+    }
 };
-
-void TrayCheckTest::withoutTrayEndsWithCodeOne()
-{
-    QProcess delvix;
-    delvix.start(QCoreApplication::applicationDirPath() + "/delvix");
-    QVERIFY(delvix.waitForStarted());
-    QVERIFY(DesktopDriver::pressKeysIn("^Systray$", {"Return"}));
-    QVERIFY(delvix.waitForFinished(15000));
-    QCOMPARE(delvix.exitStatus(), QProcess::NormalExit);
-    QCOMPARE(delvix.exitCode(), 1);
-}
 
 QTEST_GUILESS_MAIN(TrayCheckTest)
 #include "tst_traycheck.moc"
