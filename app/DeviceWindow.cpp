@@ -1,6 +1,7 @@
 #include "DeviceWindow.h"
 
 #include "EnsureWindowPlacementOnDesktop.h"
+#include "ModuleInfoDialog.h"
 #include "Portlex.h"
 #include "SaveXmlReport.h"
 
@@ -25,6 +26,14 @@ QString titleFor(const QString& deviceName)
     shown.replace("Zantro Simulator -", "Simulator", Qt::CaseInsensitive);
     shown.replace("Zantro USB Device:", "Device:", Qt::CaseInsensitive);
     return "Delvix - " + shown;
+}
+
+// Module information windows stand on their own: no parent, modeless, resizable.
+ModuleInfoDialog* newModuleInfoDialog()
+{
+    auto* dialog = new ModuleInfoDialog;
+    dialog->setSizeGripEnabled(true);
+    return dialog;
 }
 
 QWidget* fixedSpacer(int width, int height, QWidget* parent)
@@ -266,9 +275,11 @@ void DeviceWindow::SetTimedStatus(QString statusMessage)
     QCoreApplication::processEvents();
 }
 
-// The module information dialog will open from here; for now the route ends at the window.
-void DeviceWindow::onModuleInfoExamine(ModuleInfo)
+void DeviceWindow::onModuleInfoExamine(ModuleInfo displayMe)
 {
+    ModuleInfoDialog* dialog = newModuleInfoDialog();
+    dialog->openDeviceModule(m_deviceId, displayMe);
+    dialog->show();
 }
 
 void DeviceWindow::onTimedStatusExpire()
@@ -302,6 +313,14 @@ void DeviceWindow::onFileSystemDoubleClick(QString path)
     const QString local = QDir::cleanPath(QDir::tempPath()) + QDir::separator() + fileName;
     if (device->CopyFileToPC(path, local) != 0)
         return;
+    // A module's information file opens in the module information window, not on the desktop.
+    const QFileInfo copied(local);
+    if (copied.completeSuffix().compare(QLatin1String("mif"), Qt::CaseInsensitive) == 0) {
+        ModuleInfoDialog* dialog = newModuleInfoDialog();
+        dialog->openMifFile(local, copied.baseName());
+        dialog->show();
+        return;
+    }
     QDesktopServices::openUrl(QUrl::fromLocalFile(local));
 }
 
