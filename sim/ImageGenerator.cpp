@@ -3,12 +3,120 @@
 #include "SampleBuilder.h"
 
 #include <QDir>
+#include <QHash>
 #include <QXmlStreamWriter>
+
+#include <algorithm>
+
+namespace {
+
+// One node of a generated settings store.
+struct SettingsNode
+{
+    QString name;
+    QVector<QPair<QString, QString>> values;
+    QVector<int> children;
+};
+
+// The child counts that the generated parents take in turn: one in each of the crawl's
+// bands (up to 10, 50, 100 and more than 100 siblings).
+constexpr int SettingsFanouts[] = {5, 40, 90, 200};
+
+SettingsNode generatedNode(int index)
+{
+    SettingsNode node;
+    node.name = QStringLiteral("n%1").arg(index, 6, 10, QLatin1Char('0'));
+    // Most nodes hold nothing, a third hold a pair of values, a few hold many.
+    const int values = index % 50 == 0 ? 20 : index % 3 == 0 ? 2 : 0;
+    for (int v = 0; v < values; ++v)
+        node.values.append({QStringLiteral("key%1").arg(v, 2, 10, QLatin1Char('0')), QStringLiteral("value %1.%2").arg(index).arg(v)});
+    return node;
+}
+
+// Hangs count new nodes below parents, breadth first, each parent in turn taking the next
+// child count of the cycle.
+void growSettings(QVector<SettingsNode>& nodes, QVector<int> parents, int count)
+{
+    int turn = 0;
+    for (int next = 0; count > 0 && next < parents.size(); ++next) {
+        const int parent = parents.at(next);
+        const int take = std::min(SettingsFanouts[turn++ % std::size(SettingsFanouts)], count);
+        for (int c = 0; c < take; ++c) {
+            const int index = int(nodes.size());
+            nodes.append(generatedNode(index));
+            nodes[parent].children.append(index);
+            parents.append(index);
+        }
+        count -= take;
+    }
+}
+
+// The store below the root (node 0): the named branches, then generated nodes up to total:
+// a twentieth below "oattest", a hundredth below "CSA_REMOVAL", the rest in eight branches.
+QVector<SettingsNode> settingsStore(int total)
+{
+    QVector<SettingsNode> nodes(1);
+    QHash<QString, int> named;
+    for (const char* branch : {"appinfo", "ztoversion", "oattest", "CSA_NORMAL", "CSA_REMOVAL"}) {
+        named.insert(QLatin1String(branch), int(nodes.size()));
+        nodes[0].children.append(int(nodes.size()));
+        nodes.append({QLatin1String(branch), {{QStringLiteral("generated"), QStringLiteral("yes")}}, {}});
+    }
+    const int rest = std::max(0, total - ImageGenerator::NamedSettingsBranches);
+    const int lastRead = rest / 20;
+    const int neverRead = rest / 100;
+    growSettings(nodes, {named.value(QStringLiteral("oattest"))}, lastRead);
+    growSettings(nodes, {named.value(QStringLiteral("CSA_REMOVAL"))}, neverRead);
+    const int bulk = rest - lastRead - neverRead;
+    QVector<int> branches;
+    for (int b = 0; b < std::min(8, bulk); ++b) {
+        branches.append(int(nodes.size()));
+        nodes[0].children.append(int(nodes.size()));
+        nodes.append(generatedNode(int(nodes.size())));
+    }
+    growSettings(nodes, branches, bulk - int(branches.size()));
+    return nodes;
+}
+
+void writeSettingsNode(QXmlStreamWriter& w, const QVector<SettingsNode>& nodes, int index)
+{
+    const SettingsNode& node = nodes.at(index);
+    w.writeStartElement(QStringLiteral("node"));
+    w.writeAttribute(QStringLiteral("name"), node.name);
+    for (const auto& value : node.values) {
+        w.writeEmptyElement(QStringLiteral("value"));
+        w.writeAttribute(QStringLiteral("name"), value.first);
+        w.writeAttribute(QStringLiteral("text"), value.second);
+    }
+    for (int child : node.children)
+        writeSettingsNode(w, nodes, child);
+    w.writeEndElement();
+}
+
+// MIME record j lives in module j % modules. The first round claims a type of its own per
+// module; later rounds claim the first round's types again, as inactive entries.
+MifMimeType mimeRecord(int j, const ImageGenerator::Counts& counts)
+{
+    const auto classId = [&counts](int k) {
+        return ImageGenerator::FirstClassId + quint32(counts.classes > 0 ? k % counts.classes : 0);
+    };
+    return {classId(j), classId(j / counts.modules), QStringLiteral("application/x-gen-%1").arg(j % counts.modules)};
+}
+
+} // namespace
 
 bool ImageGenerator::generate(const QString& imageDir, const Counts& counts)
 {
-    if (counts.modules < 0 || counts.classes < 0 || counts.files < 0 || counts.processes < 0) {
+    if (counts.modules < 0 || counts.classes < 0 || counts.files < 0 || counts.processes < 0 || counts.mimeTypes < -1
+        || counts.settings < 0) {
         m_error = QStringLiteral("counts must not be negative");
+        return false;
+    }
+    const int mimeTypes = counts.mimeTypes >= 0 ? counts.mimeTypes : std::min(counts.modules, counts.classes);
+    if (mimeTypes > 0 && (counts.modules == 0 || (mimeTypes - 1) / counts.modules >= MaxMimeTypesPerModule)) {
+        m_error = QStringLiteral("%1 MIME types need at least %2 modules")
+                      .arg(mimeTypes)
+                      .arg((mimeTypes - 1) / MaxMimeTypesPerModule + 1);
         return false;
     }
     const QDir image(imageDir);
@@ -29,9 +137,8 @@ bool ImageGenerator::generate(const QString& imageDir, const Counts& counts)
         // Module m exports every class k with k % modules == m.
         for (int k = m; k < counts.classes; k += counts.modules)
             module.mif.classes.append(FirstClassId + quint32(k));
-        if (!module.mif.classes.isEmpty())
-            module.mif.mimeTypes.append({module.mif.classes.first(), FirstClassId,
-                                         QStringLiteral("application/x-gen-%1").arg(m)});
+        for (int j = m; j < mimeTypes; j += counts.modules)
+            module.mif.mimeTypes.append(mimeRecord(j, counts));
         const QString folder = image.filePath(QStringLiteral("flash/usermod/g%1").arg(m / ModulesPerFolder, 3, 10, QLatin1Char('0')));
         if (!SampleBuilder::writeModule(folder, module, &m_error))
             return false;
@@ -63,14 +170,9 @@ bool ImageGenerator::writeProfile(const QString& imageDir, const Counts& counts)
     w.writeAttribute(QStringLiteral("zantVersion"), QStringLiteral("3.2.0"));
 
     w.writeStartElement(QStringLiteral("settings"));
-    for (const char* branch : {"appinfo", "ztoversion", "oattest", "CSA_NORMAL", "CSA_REMOVAL"}) {
-        w.writeStartElement(QStringLiteral("node"));
-        w.writeAttribute(QStringLiteral("name"), QLatin1String(branch));
-        w.writeEmptyElement(QStringLiteral("value"));
-        w.writeAttribute(QStringLiteral("name"), QStringLiteral("generated"));
-        w.writeAttribute(QStringLiteral("text"), QStringLiteral("yes"));
-        w.writeEndElement();
-    }
+    const QVector<SettingsNode> store = settingsStore(counts.settings);
+    for (int branch : store.first().children)
+        writeSettingsNode(w, store, branch);
     w.writeEndElement();
 
     w.writeStartElement(QStringLiteral("processes"));

@@ -3,8 +3,9 @@
 #include <QString>
 
 // Writes a large synthetic device image for benchmarks and load tests: N modules with
-// MIFs below usermod/, N classes spread over them, N files in one folder (/shared/bulk)
-// and N resident processes. The same counts always give the same image.
+// MIFs below usermod/, N classes spread over them, N MIME records in those MIFs (the
+// registry), N files in one folder (/shared/bulk), N resident processes and a settings
+// store of N nodes. The same counts always give the same image.
 class ImageGenerator
 {
 public:
@@ -14,6 +15,10 @@ public:
         int classes = 200;
         int files = 100;
         int processes = 10;
+        // -1: one MIME record per module that exports a class.
+        int mimeTypes = -1;
+        // Nodes of the settings store; it always holds the five named branches.
+        int settings = 0;
     };
 
     bool generate(const QString& imageDir, const Counts& counts);
@@ -21,6 +26,10 @@ public:
 
     static constexpr int ModulesPerFolder = 100;
     static constexpr quint32 FirstClassId = 0x7E000001;
+    // The branches the settings page treats specially; every generated store has them.
+    static constexpr int NamedSettingsBranches = 5;
+    // A MIF counts its MIME records in 16 bits.
+    static constexpr int MaxMimeTypesPerModule = 0xFFFF;
 
 private:
     bool writeProfile(const QString& imageDir, const Counts& counts);

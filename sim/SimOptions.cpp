@@ -17,7 +17,11 @@ QString SimOptions::helpText()
         "Usage:\n"
         "  zantro-sim --image DIR [options]      serve one device until SIGINT or SIGTERM\n"
         "  zantro-sim generate OUT --modules N --classes N --files N --processes N\n"
-        "                                        write a large synthetic image to OUT\n"
+        "                      [--mime-types N] [--settings N]\n"
+        "                                        write a large synthetic image to OUT: N MIME\n"
+        "                                        records in the modules (default one per module\n"
+        "                                        that exports a class), a settings store of N\n"
+        "                                        nodes (default the five named branches)\n"
         "  zantro-sim make-sample DESCRIPTION IMAGE\n"
         "                                        write the modules and files a sample\n"
         "                                        description lists into IMAGE\n"
@@ -32,9 +36,11 @@ QString SimOptions::helpText()
         "  --socket-dir DIR       folder of the socket (default: $ZANTRO_SIM_DIR, else the\n"
         "                         per-user runtime folder + /zantro-sim); created with mode 0700\n"
         "  --reset                serve a fresh copy of the image in a temporary folder; the\n"
-        "                         image itself stays untouched\n"
+        "                         image itself stays untouched, and copies left by killed\n"
+        "                         simulators are removed\n"
         "  --refuse-connect CODE:TEXT\n"
-        "                         answer every Connect with result CODE and status TEXT\n"
+        "                         answer every Connect with result CODE and status TEXT (and\n"
+        "                         so serve nothing else)\n"
         "  --latency MS           delay every answer by MS milliseconds\n"
         "  --run-lifetime MS      how long a process started by RunApplication lives\n"
         "                         (default 10000)\n"
@@ -138,7 +144,9 @@ bool SimOptions::parseGenerate(const QStringList& arguments)
     const QCommandLineOption classes(QStringLiteral("classes"), QString(), QStringLiteral("N"), QStringLiteral("200"));
     const QCommandLineOption files(QStringLiteral("files"), QString(), QStringLiteral("N"), QStringLiteral("100"));
     const QCommandLineOption processes(QStringLiteral("processes"), QString(), QStringLiteral("N"), QStringLiteral("10"));
-    parser.addOptions({modules, classes, files, processes});
+    const QCommandLineOption mimeTypes(QStringLiteral("mime-types"), QString(), QStringLiteral("N"));
+    const QCommandLineOption settings(QStringLiteral("settings"), QString(), QStringLiteral("N"), QStringLiteral("0"));
+    parser.addOptions({modules, classes, files, processes, mimeTypes, settings});
     QStringList rest = arguments;
     rest.removeAt(1);
     if (!parser.parse(rest))
@@ -148,15 +156,18 @@ bool SimOptions::parseGenerate(const QStringList& arguments)
     command = Command::Generate;
     outputDir = parser.positionalArguments().first();
 
-    const auto count = [&parser, this](const QCommandLineOption& option, int& value) {
+    const auto count = [&parser, this](const QCommandLineOption& option, int& value, int most = 1000000) {
         bool ok = false;
         value = parser.value(option).toInt(&ok);
-        if (!ok || value < 0 || value > 1000000)
-            return fail(QStringLiteral("--%1 expects a count between 0 and 1000000").arg(option.names().first()));
+        if (!ok || value < 0 || value > most)
+            return fail(QStringLiteral("--%1 expects a count between 0 and %2").arg(option.names().first()).arg(most));
         return true;
     };
+    // A node takes about a hundred bytes of device.xml, which has a size limit.
+    constexpr int MostSettings = 100000;
     return count(modules, counts.modules) && count(classes, counts.classes) && count(files, counts.files)
-        && count(processes, counts.processes);
+        && count(processes, counts.processes) && (!parser.isSet(mimeTypes) || count(mimeTypes, counts.mimeTypes))
+        && count(settings, counts.settings, MostSettings);
 }
 
 bool SimOptions::parseMakeSample(const QStringList& arguments)
