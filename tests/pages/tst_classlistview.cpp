@@ -127,14 +127,11 @@ private slots:
         QCOMPARE(report, QString("<!DOCTYPE zant-class-ids>\n"
                                  "<ZTOINFO>\n"
                                  " <ZTOVERSION version=\"3.2.9\" target=\"0x0A110021\" manufacturer=\"Zantro &amp; Sons\" "
-                                 "model=\"&quot;Slim&quot;\"/>\n"
-                                 " <ZantHeaderDataList>\n"
+                                 "model=\"&quot;Slim&quot;\"/>\n <ZantHeaderDataList>\n"
                                  "  <ZTOId path=\"\" subfamily=\"unknown\" family=\"unknown\" value=\"0x00000003\" name=\"unknown\"/>\n"
                                  "  <ZTOId path=\"/usermod/b/b.mif\" subfamily=\"unknown\" family=\"F\" value=\"0x00000002\" name=\"Beta\"/>\n"
                                  "  <ZTOId path=\"zkernel\" subfamily=\"S\" family=\"F &amp; G\" value=\"0x00000001\" "
-                                 "name=\"alpha &lt;1&gt;\"/>\n"
-                                 " </ZantHeaderDataList>\n"
-                                 "</ZTOINFO>\n"));
+                                 "name=\"alpha &lt;1&gt;\"/>\n </ZantHeaderDataList>\n</ZTOINFO>\n"));
         page._classIDTable->sortByColumn(NameColumn, Qt::AscendingOrder);
         QCOMPARE(page.xmlReport(), report);
     }

@@ -96,18 +96,12 @@ private slots:
         page._familyTree->sortByColumn(2, Qt::DescendingOrder);
         const QString expected = "<!DOCTYPE familyTree>\n"
                                  "<deviceTree device=\"0x0A110021\" manufacturer=\"Zantro &amp; Sons\">\n"
-                                 " <family name=\"Kernel\">\n"
-                                 "  <subfamily name=\"Memory\">\n"
+                                 " <family name=\"Kernel\">\n  <subfamily name=\"Memory\">\n"
                                  "   <class name=\"Heap\" classid=\"0x00000003\"/>\n"
-                                 "  </subfamily>\n"
-                                 " </family>\n"
-                                 " <family name=\"Media\">\n"
-                                 "  <subfamily name=\"Audio\">\n"
+                                 "  </subfamily>\n </family>\n <family name=\"Media\">\n  <subfamily name=\"Audio\">\n"
                                  "   <class name=\"beta\" classid=\"0x00000001\"/>\n"
                                  "   <class name=\"Alpha\" classid=\"0x00000002\"/>\n"
-                                 "  </subfamily>\n"
-                                 " </family>\n"
-                                 "</deviceTree>\n";
+                                 "  </subfamily>\n </family>\n</deviceTree>\n";
         QCOMPARE(page.xmlReport(), expected);
         page._familyTree->sortByColumn(2, Qt::AscendingOrder);
         delete page._familyTree->topLevelItem(0);

@@ -48,153 +48,81 @@ private slots:
 )"));
     }
 
-    // Sorted by name whatever order the folder lists them in (created here neither sorted
-    // nor in reverse), letter case aside.
-    void offersTheLevelFilesSorted()
+    // Sorted by name whatever order the folder lists them in, letter case aside; without a
+    // folder, the levels beside the program. Offering is not choosing.
+    void offersTheLevelFiles()
     {
         QTemporaryDir levels;
-        const QStringList created = {"b-level.xml", "C.xml.bak", "a-level.xml", "Alpha.xml", "notes.txt"};
-        for (const QString& name : created)
+        for (const char* name : {"b-level.xml", "C.xml.bak", "a-level.xml", "Alpha.xml", "notes.txt"})
             QVERIFY(TestSupport::writeFile(levels.filePath(name), "<level/>"));
         DeviceCache cache = smallDevice();
-        LevelViewWidget page;
+        LevelViewWidget page, shipped;
         QSignalSpy states(&page, &GatewayComponentWidget::stateChanged);
         page.setDeviceRecord(nullptr, levels.path());
         QCOMPARE(page._levelDocuments->count(), 1);
         page.setDeviceRecord(&cache, levels.path());
-        QStringList texts, paths;
-        for (int i = 1; i < page._levelDocuments->count(); ++i) {
-            texts << page._levelDocuments->itemText(i);
-            paths << page._levelDocuments->itemData(i).toString();
-        }
-        QCOMPARE(texts, QStringList({"a-level", "Alpha", "b-level", "C"}));
-        QCOMPARE(paths, QStringList({levels.filePath("a-level.xml"), levels.filePath("Alpha.xml"),
-                                     levels.filePath("b-level.xml"), levels.filePath("C.xml.bak")}));
-        // Offering is not choosing.
+        QStringList texts, files;
+        for (int i = 1; i < page._levelDocuments->count(); ++i)
+            texts << page._levelDocuments->itemText(i) + "=" + page._levelDocuments->itemData(i).toString();
+        QCOMPARE(texts, QStringList({"a-level=" + levels.filePath("a-level.xml"), "Alpha=" + levels.filePath("Alpha.xml"),
+                                     "b-level=" + levels.filePath("b-level.xml"), "C=" + levels.filePath("C.xml.bak")}));
         QCOMPARE(page._levelDocuments->currentIndex(), 0);
         QCOMPARE(states.count(), 0);
-    }
-
-    // Without a folder, the levels beside the program are offered.
-    void offersTheShippedLevels()
-    {
-        QStringList files;
         listLevelFiles(files);
         QVERIFY(files.size() >= 2);
         files.sort(Qt::CaseInsensitive);
-        DeviceCache cache = smallDevice();
-        LevelViewWidget page;
-        page.setDeviceRecord(&cache);
-        QStringList paths;
-        for (int i = 1; i < page._levelDocuments->count(); ++i)
-            paths << page._levelDocuments->itemData(i).toString();
-        QCOMPARE(paths, files);
+        shipped.setDeviceRecord(&cache);
+        texts.clear();
+        for (int i = 1; i < shipped._levelDocuments->count(); ++i)
+            texts << shipped._levelDocuments->itemData(i).toString();
+        QCOMPARE(texts, files);
     }
 
-    // Families sorted, the rest in file order, every branch open; the export shows it.
+    // Families sorted, the rest in file order, every branch open. An export before a choice,
+    // or of an earlier level, never stands for the level shown; an unreadable one keeps it.
     void checksALevelAgainstTheClasses()
     {
+        const QString first = m_folder.filePath("first.xml");
+        QVERIFY(TestSupport::writeFile(first, R"(<level><Id value="0x01000001" name="Player"/></level>)"));
         DeviceCache cache = smallDevice();
         LevelViewWidget page;
         page.setDeviceRecord(&cache);
+        QCOMPARE(page.xmlReport(), QString("<!DOCTYPE levelreport>\n<device/>\n"));
+        choose(page, first);
+        QCOMPARE(page.xmlReport(), QString("<!DOCTYPE levelreport>\n<device>\n <family name=\"Media\">\n  <subfamily name=\"Audio\">\n"
+                                           "   <class name=\"Player\" classid=\"0x01000001\" available=\"Found\"/>\n"
+                                           "  </subfamily>\n </family>\n</device>\n"));
         QSignalSpy statuses(&page, &GatewayComponentWidget::statusChanged);
         choose(page, m_small);
         QCOMPARE(signalTexts(statuses), QStringList({"Processing", "Ready"}));
         QCOMPARE(page.state(), GatewayComponentWidget::Complete);
         for (QTreeWidgetItemIterator it(page._level1Tree, QTreeWidgetItemIterator::HasChildren); *it; ++it)
             QVERIFY((*it)->isExpanded());
-        QCOMPARE(page.xmlReport(), QString("<!DOCTYPE levelreport>\n"
-                                           "<device>\n"
-                                           " <family name=\"\">\n"
-                                           "  <subfamily name=\"\">\n"
-                                           "   <class name=\"Missing\" classid=\"0x01000099\" available=\"Not Found\"/>\n"
-                                           "   <class name=\"AlsoMissing\" classid=\"0x01000098\" available=\"Not Found\"/>\n"
-                                           "  </subfamily>\n"
-                                           " </family>\n"
-                                           " <family name=\"Kernel\">\n"
-                                           "  <subfamily name=\"Memory\">\n"
-                                           "   <class name=\"FromFile\" classid=\"0x0100000A\" available=\"Found\"/>\n"
-                                           "  </subfamily>\n"
-                                           " </family>\n"
-                                           " <family name=\"media\">\n"
-                                           "  <subfamily name=\"Video\">\n"
-                                           "   <class name=\"Camera\" classid=\"0x01000002\" available=\"Found\"/>\n"
-                                           "  </subfamily>\n"
-                                           "  <subfamily name=\"Audio\">\n"
-                                           "   <class name=\"Player\" classid=\"0x01000001\" available=\"Found\"/>\n"
-                                           "  </subfamily>\n"
-                                           "  <subfamily name=\"audio\">\n"
-                                           "   <class name=\"Mixer\" classid=\"0x01000003\" available=\"Not Found\"/>\n"
-                                           "  </subfamily>\n"
-                                           " </family>\n"
-                                           "</device>\n"));
-    }
-
-    // An export taken before a choice, or of an earlier level, never stands for the level shown.
-    void exportFollowsTheLevelShown()
-    {
-        const QString first = m_folder.filePath("first.xml");
-        const QString second = m_folder.filePath("second.xml");
-        QVERIFY(TestSupport::writeFile(first, R"(<level><Id value="0x01000001" name="Player"/></level>)"));
-        QVERIFY(TestSupport::writeFile(second, R"(<level><Id value="0x01000099" name="Missing"/></level>)"));
-        DeviceCache cache = smallDevice();
-        LevelViewWidget page;
-        page.setDeviceRecord(&cache);
-        QCOMPARE(page.xmlReport(), QString("<!DOCTYPE levelreport>\n<device/>\n"));
-
-        choose(page, first);
-        const QString firstReport = page.xmlReport();
-        QCOMPARE(firstReport, QString("<!DOCTYPE levelreport>\n"
-                                      "<device>\n"
-                                      " <family name=\"Media\">\n"
-                                      "  <subfamily name=\"Audio\">\n"
-                                      "   <class name=\"Player\" classid=\"0x01000001\" available=\"Found\"/>\n"
-                                      "  </subfamily>\n"
-                                      " </family>\n"
-                                      "</device>\n"));
-        choose(page, second);
-        const QString secondReport = page.xmlReport();
-        QVERIFY(secondReport != firstReport);
-        QCOMPARE(secondReport, QString("<!DOCTYPE levelreport>\n"
-                                       "<device>\n"
-                                       " <family name=\"\">\n"
-                                       "  <subfamily name=\"\">\n"
-                                       "   <class name=\"Missing\" classid=\"0x01000099\" available=\"Not Found\"/>\n"
-                                       "  </subfamily>\n"
-                                       " </family>\n"
-                                       "</device>\n"));
-        // A level that cannot be read keeps the tree, and the export with it.
-        choose(page, m_folder.filePath("missing.xml"));
-        QCOMPARE(page.xmlReport(), secondReport);
-    }
-
-    // Going back to the prompt, or choosing a level that cannot be read, keeps the tree.
-    void laterChoiceKeepsTheTree_data()
-    {
-        QTest::addColumn<QString>("path");
-        QTest::addColumn<QString>("status");
-        QTest::addColumn<GatewayComponentWidget::ComponentState>("state");
-        QTest::newRow("prompt") << "" << "Processing" << GatewayComponentWidget::Processing;
-        QTest::newRow("unreadable") << "missing.xml" << "Level file not found" << GatewayComponentWidget::Failed;
-    }
-
-    void laterChoiceKeepsTheTree()
-    {
-        QFETCH(QString, path);
-        QFETCH(QString, status);
-        QFETCH(GatewayComponentWidget::ComponentState, state);
-        DeviceCache cache = smallDevice();
-        LevelViewWidget page;
-        page.setDeviceRecord(&cache);
-        choose(page, m_small);
+        const QString report = page.xmlReport();
+        QCOMPARE(report, QString("<!DOCTYPE levelreport>\n"
+                                 "<device>\n <family name=\"\">\n  <subfamily name=\"\">\n"
+                                 "   <class name=\"Missing\" classid=\"0x01000099\" available=\"Not Found\"/>\n"
+                                 "   <class name=\"AlsoMissing\" classid=\"0x01000098\" available=\"Not Found\"/>\n"
+                                 "  </subfamily>\n </family>\n <family name=\"Kernel\">\n  <subfamily name=\"Memory\">\n"
+                                 "   <class name=\"FromFile\" classid=\"0x0100000A\" available=\"Found\"/>\n"
+                                 "  </subfamily>\n </family>\n <family name=\"media\">\n  <subfamily name=\"Video\">\n"
+                                 "   <class name=\"Camera\" classid=\"0x01000002\" available=\"Found\"/>\n"
+                                 "  </subfamily>\n  <subfamily name=\"Audio\">\n"
+                                 "   <class name=\"Player\" classid=\"0x01000001\" available=\"Found\"/>\n"
+                                 "  </subfamily>\n  <subfamily name=\"audio\">\n"
+                                 "   <class name=\"Mixer\" classid=\"0x01000003\" available=\"Not Found\"/>\n"
+                                 "  </subfamily>\n </family>\n</device>\n"));
+        // Choosing a level that cannot be read, or the prompt again, keeps the tree and its export.
         const QStringList tree = treeLines(page._level1Tree);
-        QVERIFY(!tree.isEmpty());
-        if (path.isEmpty())
-            page._levelDocuments->setCurrentIndex(0);
-        else
-            choose(page, m_folder.filePath(path));
-        QCOMPARE(page.status(), status);
-        QCOMPARE(page.state(), state);
+        choose(page, m_folder.filePath("missing.xml"));
+        QCOMPARE(page.status(), QString("Level file not found"));
+        QCOMPARE(page.state(), GatewayComponentWidget::Failed);
+        QVERIFY(!page.isComplete() && !page.canSearch());
+        QCOMPARE(treeLines(page._level1Tree), tree);
+        QCOMPARE(page.xmlReport(), report);
+        page._levelDocuments->setCurrentIndex(0);
+        QCOMPARE(page.status(), QString("Processing"));
+        QCOMPARE(page.state(), GatewayComponentWidget::Processing);
         QVERIFY(!page.isComplete() && !page.canSearch());
         QCOMPARE(treeLines(page._level1Tree), tree);
     }
