@@ -1,89 +1,127 @@
 #include "DeviceConnection.h"
-#include "FrameDecoder.h"
 #include "FrameServer.h"
+#include "Portlex.h"
 #include "PortlexErrors.h"
+#include "ServerConnection.h"
 #include "TestSupport.h"
+#include "_ZantDevice.h"
 
-#include <QEventLoop>
-#include <QFutureWatcher>
 #include <QLocalServer>
 #include <QLocalSocket>
+#include <QScopeGuard>
+#include <QSemaphore>
 #include <QTemporaryDir>
-#include <QThreadPool>
-#include <QtConcurrent>
 #include <QtEndian>
 #include <QtTest>
 
+#include <sys/resource.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/un.h>
+#include <unistd.h>
 
+#include <atomic>
 #include <functional>
-#include <memory>
+#include <vector>
+
+using namespace TestSupport;
 
 namespace {
 
-constexpr int HalfOpenMs = 300;
+constexpr quint64 CopySize = 3 * Protocol::TransferChunkSize;
+constexpr quint32 TransferId = 7;
+// What the socket folder is, or (from File on) what already sits at the socket path.
+enum Place { Missing, Folder, Link, Foreign, File, FileLink, Directory, StaleSocket, ForeignPeer };
 
-class TestHandler : public RequestHandler
+// The device: GetVolumes answers 7, GetRegistry fails with 3, a transfer chunk carries 1 MiB
+// (and hangs at hangAtChunk, as a stopped process does), RunApplication works long.
+class Handler : public RequestHandler
 {
 public:
     QString displayName() const override { return QStringLiteral("Zantro Simulator - Bench"); }
     QString deviceId() const override { return QStringLiteral("bench-1"); }
+    void connectionClosed(quint64 id) override { lastClosed = id, ++closed; }
 
     Answer handle(const Request& request) override
     {
         ++handled;
-        if (request.operation == Operation::GetVolumes)
+        lastConnection = request.connectionId;
+        switch (request.operation) {
+        case Operation::GetVolumes:
             return Answer::success(quint32(7));
-        return request.operation == Operation::GetRegistry ? Answer::failure(3) : Answer::success();
+        case Operation::GetRegistry:
+            return Answer::failure(3);
+        case Operation::GetCache:
+            return Answer::success(DeviceCache());
+        case Operation::CopyToPCBegin:
+            transferConnection = request.connectionId;
+            return Answer::success(TransferId, CopySize);
+        case Operation::CopyToDeviceBegin:
+        case Operation::InstallPackageBegin:
+            transferConnection = request.connectionId;
+            return Answer::success(TransferId, QStringLiteral("begun"));
+        case Operation::CopyToPCChunk:
+        case Operation::UploadChunk:
+            if (++chunks == hangAtChunk)
+                hung.acquire();
+            return request.operation == Operation::UploadChunk
+                ? Answer::success()
+                : Answer::success(QByteArray(Protocol::TransferChunkSize, 'c'));
+        case Operation::RunApplication:
+            for (int i = 0; i < keepAlives; ++i) {
+                request.keepAlive();
+                QThread::msleep(50); // the work between two notices
+            }
+            QThread::msleep(ulong(silenceMs.load()));
+            return Answer::success(QStringLiteral("done"));
+        default:
+            return Answer::success(QString());
+        }
     }
 
-    void connectionClosed(quint64 connectionId) override { closed << connectionId; }
-
-    int handled = 0;
-    QList<quint64> closed;
+    std::atomic<quint64> lastConnection {0}, transferConnection {0}, lastClosed {0};
+    std::atomic<int> handled {0}, chunks {0}, closed {0}, hangAtChunk {0}, keepAlives {0}, silenceMs {0};
+    QSemaphore hung;
 };
 
-// A DeviceConnection driven from a thread of its own while the test's thread runs the
-// server's event loop, as the GUI's workers use the gateway.
-class Client
+// A FrameServer on a thread of its own, so that the test's thread can make blocking calls
+// and raw socket moves while the device serves, or hangs.
+class Device
 {
 public:
-    explicit Client(const QString& socketPath)
-        : m_connection(std::make_unique<DeviceConnection>(socketPath))
+    explicit Device(const QString& socketPath, int maxConnections = FrameServer::DefaultMaxConnections,
+                    int halfOpenMs = Protocol::HalfOpenTimeoutMs)
     {
-        m_thread.setMaxThreadCount(1);
-        m_thread.setExpiryTimeout(-1);
-    }
-    ~Client() { run([this] { m_connection.reset(); return 0; }); }  // its socket belongs to the client thread
-
-    qint32 call(Operation operation, QByteArray* body = nullptr, int timeoutMs = 2000)
-    {
-        QByteArray answer;
-        const qint32 result = run([&] {
-            return m_connection->call(operation, QByteArray(), Protocol::NoFlags, &answer, QDeadlineTimer(timeoutMs));
+        m_context.moveToThread(&m_thread);
+        m_thread.start();
+        onDevice([&] {
+            server = new FrameServer(&handler);
+            server->setMaxConnections(maxConnections);
+            server->setHalfOpenTimeout(halfOpenMs);
+            listening = server->listen(socketPath);
+            error = server->errorString();
         });
-        if (body)
-            *body = answer;
-        return result;
+    }
+    ~Device()
+    {
+        handler.hung.release(100);
+        onDevice([&] { delete server; });
+        m_thread.quit();
+        m_thread.wait();
+    }
+    template<typename F> void onDevice(F work, Qt::ConnectionType type = Qt::BlockingQueuedConnection)
+    {
+        QMetaObject::invokeMethod(&m_context, work, type);
     }
 
-    DeviceConnection& connection() { return *m_connection; }
+    Handler handler;
+    FrameServer* server = nullptr;
+    bool listening = false;
+    QString error;
 
 private:
-    template <typename F>
-    qint32 run(F work)
-    {
-        QFutureWatcher<qint32> watcher;
-        QEventLoop loop;
-        QObject::connect(&watcher, &QFutureWatcher<qint32>::finished, &loop, &QEventLoop::quit);
-        watcher.setFuture(QtConcurrent::run(&m_thread, work));
-        if (!watcher.isFinished())
-            loop.exec();
-        return watcher.result();
-    }
-
-    QThreadPool m_thread;
-    std::unique_ptr<DeviceConnection> m_connection;
+    QThread m_thread;
+    QObject m_context;
 };
 
 // A device written by hand, to send what the real server never would: every frame it
@@ -91,7 +129,8 @@ private:
 class ScriptedDevice : public QLocalServer
 {
 public:
-    ScriptedDevice(const QString& path, std::function<Frame(const Frame&)> reply)
+    ScriptedDevice(const QString& path, std::function<Frame(const Frame&)> reply, QObject* parent)
+        : QLocalServer(parent)
     {
         listen(path);
         connect(this, &QLocalServer::newConnection, this, [this, reply] {
@@ -122,6 +161,52 @@ QByteArray helloFrame(quint16 headerVersion, quint16 payloadVersion)
     return Frame { headerVersion, 0, 1, quint32(Operation::Hello), payload }.encode();
 }
 
+qint32 ask(DeviceConnection& connection, Operation operation, int allowedMs = 5000, QByteArray* body = nullptr)
+{
+    QByteArray ignored;
+    return connection.call(operation, QByteArray(), Protocol::NoFlags, body ? body : &ignored, QDeadlineTimer(allowedMs));
+}
+
+// One call over a fresh connection.
+qint32 call(const QString& socketPath, Operation operation, QString* error = nullptr)
+{
+    DeviceConnection connection(socketPath);
+    const qint32 result = ask(connection, operation);
+    if (error)
+        *error = connection.errorString();
+    return result;
+}
+
+sockaddr_un addressOf(const QString& path)
+{
+    sockaddr_un address {};
+    address.sun_family = AF_UNIX;
+    qstrncpy(address.sun_path, QFile::encodeName(path).constData(), sizeof address.sun_path);
+    return address;
+}
+
+int connectRaw(const QString& path)
+{
+    const int fd = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    const sockaddr_un address = addressOf(path);
+    if (fd >= 0 && ::connect(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
+        ::close(fd);
+        return -1;
+    }
+    return fd;
+}
+
+// A bare listener that nobody serves; the kernel records who listens when listen() runs.
+int listenRaw(const QString& path, uid_t as)
+{
+    const uid_t self = ::geteuid();
+    const int fd = ::socket(AF_UNIX, SOCK_STREAM | SOCK_NONBLOCK | SOCK_CLOEXEC, 0);
+    const sockaddr_un address = addressOf(path);
+    const bool ok = ::bind(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0
+        && ::seteuid(as) == 0 && ::listen(fd, 8) == 0;
+    return ::seteuid(self) == 0 && ok ? fd : -1;
+}
+
 mode_t modeOf(const QString& path)
 {
     struct stat info;
@@ -130,194 +215,386 @@ mode_t modeOf(const QString& path)
 
 } // namespace
 
+// The transport: FrameServer against DeviceConnection, raw sockets and hand-written devices.
 class FrameServerTest : public QObject
 {
     Q_OBJECT
 
     std::unique_ptr<QTemporaryDir> m_dir;
-    std::unique_ptr<TestHandler> m_handler;
-    std::unique_ptr<FrameServer> m_server;
+    QString m_folder;
     QString m_socketPath;
 
 private slots:
     void init()
     {
         m_dir = std::make_unique<QTemporaryDir>();
-        QVERIFY(m_dir->isValid());
-        m_socketPath = m_dir->filePath(QStringLiteral("sockets/bench-1"));
-        m_handler = std::make_unique<TestHandler>();
-        m_server = std::make_unique<FrameServer>(m_handler.get());
-        m_server->setHalfOpenTimeout(HalfOpenMs);
-        QVERIFY2(m_server->listen(m_socketPath), qPrintable(m_server->errorString()));
+        m_folder = m_dir->filePath(QStringLiteral("sockets"));
+        m_socketPath = m_folder + QStringLiteral("/bench-1");
+        qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_folder));
+        Portlex::Initialize();
     }
 
     void cleanup()
     {
-        m_server.reset();
-        m_handler.reset();
+        Portlex::Destroy();
+        DeviceConnection::setCallTimeoutMs(Protocol::CallTimeoutMs);
         m_dir.reset();
     }
 
-    void handshakeAndAnswers()
-    {
-        Client client(m_socketPath);
-        QByteArray body;
-        QCOMPARE(client.call(Operation::GetVolumes, &body), 0);
-        QCOMPARE(client.connection().displayName(), QStringLiteral("Zantro Simulator - Bench"));
-        QCOMPARE(client.connection().deviceId(), QStringLiteral("bench-1"));
-        quint32 seven = 0;
-        PayloadStream(body) >> seven;
-        QCOMPARE(seven, 7u);
-
-        QCOMPARE(client.call(Operation::GetRegistry), 3);
-        QCOMPARE(client.call(Operation(999)), qint32(PortlexError::UnknownOperation));
-        QCOMPARE(m_handler->handled, 2);  // the unknown operation never reached the handler
-        QVERIFY(m_handler->closed.isEmpty());  // all of it over the one connection
-    }
-
-    void versionMismatchRefused_data()
-    {
-        QTest::addColumn<quint16>("headerVersion");
-        QTest::addColumn<quint16>("payloadVersion");
-        QTest::newRow("newer client") << quint16(Protocol::ProtocolVersion + 1) << quint16(Protocol::ProtocolVersion + 1);
-        QTest::newRow("payload disagrees with header") << Protocol::ProtocolVersion << quint16(0);
-    }
-
-    void versionMismatchRefused()
-    {
-        QFETCH(quint16, headerVersion);
-        QFETCH(quint16, payloadVersion);
-        QLocalSocket raw;
-        QByteArray received;
-        connect(&raw, &QLocalSocket::readyRead, this, [&] { received += raw.readAll(); });
-        raw.connectToServer(m_socketPath);
-        QVERIFY(raw.waitForConnected());
-        raw.write(helloFrame(headerVersion, payloadVersion));
-        // The device answers, then closes the connection.
-        QTRY_COMPARE(raw.state(), QLocalSocket::UnconnectedState);
-
-        FrameDecoder decoder;
-        decoder.feed(received);
-        Frame answer;
-        QCOMPARE(decoder.next(&answer), FrameDecoder::Status::Ready);
-        QCOMPARE(answer.requestId, 1u);
-        PayloadStream in(answer.payload);
-        qint32 result = 0;
-        QString message;
-        in >> result >> message;
-        QCOMPARE(result, qint32(PortlexError::VersionMismatch));
-        QVERIFY2(message.contains(QStringLiteral("version %1").arg(payloadVersion)), qPrintable(message));
-        QVERIFY2(message.contains(QStringLiteral("speaks version %1").arg(Protocol::ProtocolVersion)), qPrintable(message));
-    }
-
-    void misbehavingClientClosedAlone_data()
+    void badClientClosedAlone_data()
     {
         const Frame partial { Protocol::ProtocolVersion, 0, 2, quint32(Operation::GetModules), QByteArray(100, 'p') };
         const Frame early { Protocol::ProtocolVersion, 0, 1, quint32(Operation::GetModules), QByteArray() };
-        QByteArray oversized(Protocol::HeaderSize, '\0');
-        qToBigEndian<quint32>(Protocol::FrameMagic, oversized.data());
-        qToBigEndian<quint32>(Protocol::MaxPayloadSize + 1, oversized.data() + 4);
+        QByteArray beyondAChunk(Protocol::HeaderSize, '\0');
+        qToBigEndian<quint32>(Protocol::FrameMagic, beyondAChunk.data());
+        qToBigEndian<quint32>(Protocol::MaxRequestSize + 1, beyondAChunk.data() + 4);
         const QByteArray hello = helloFrame(Protocol::ProtocolVersion, Protocol::ProtocolVersion);
 
         QTest::addColumn<QByteArray>("bytes");
-        QTest::newRow("garbage") << QByteArray("\x01\x02\x03 definitely not a frame \xff\xfe");
-        QTest::newRow("oversized frame") << hello + oversized;
-        QTest::newRow("half-sent frame") << hello + partial.encode().left(60);
-        QTest::newRow("request before handshake") << early.encode();
-        QTest::newRow("half-sent header") << QByteArray("ZN");
+        QTest::addColumn<QString>("reason");    // logged on closing
+        QTest::addColumn<quint16>("mismatch");  // the version the refusal names, if any
+        QTest::newRow("garbage") << QByteArray("\x01\x02\x03 definitely not a frame \xff\xfe")
+                                 << "Not a protocol frame" << quint16(0);
+        // Refused from the header: the device neither waits for nor holds more than a request can need.
+        QTest::newRow("request beyond a chunk") << hello + beyondAChunk << "exceeds the limit" << quint16(0);
+        QTest::newRow("half-sent frame") << hello + partial.encode().left(60) << "half open" << quint16(0);
+        QTest::newRow("request before handshake") << early.encode() << "before the handshake" << quint16(0);
+        QTest::newRow("half-sent header") << QByteArray("ZN") << "half open" << quint16(0);
         // Closed by the half-open timer, which the greeted client, idle longer, outlives.
-        QTest::newRow("silent connection") << QByteArray();
+        QTest::newRow("silent connection") << QByteArray() << "half open" << quint16(0);
+        const quint16 newer = Protocol::ProtocolVersion + 1;
+        QTest::newRow("newer client") << helloFrame(newer, newer) << QString() << newer;
+        QTest::newRow("payload disagrees with header") << helloFrame(Protocol::ProtocolVersion, 0) << QString() << quint16(0);
     }
 
-    void misbehavingClientClosedAlone()
+    void badClientClosedAlone()
     {
         QFETCH(QByteArray, bytes);
-        auto good = std::make_unique<Client>(m_socketPath);
-        QCOMPARE(good->call(Operation::GetModules), 0);
+        QFETCH(QString, reason);
+        QFETCH(quint16, mismatch);
+        Device device(m_socketPath, FrameServer::DefaultMaxConnections, 300);
+        auto good = std::make_unique<DeviceConnection>(m_socketPath);
+        QCOMPARE(ask(*good, Operation::GetModules), 0);
 
+        if (!reason.isEmpty())
+            QTest::ignoreMessage(QtWarningMsg, QRegularExpression(QStringLiteral("Closing connection 2: .*") + reason));
         QLocalSocket bad;
+        QByteArray received;
+        connect(&bad, &QLocalSocket::readyRead, this, [&] { received += bad.readAll(); });
         bad.connectToServer(m_socketPath);
         QVERIFY(bad.waitForConnected());
         bad.write(bytes);
         bad.flush();
         QTRY_COMPARE(bad.state(), QLocalSocket::UnconnectedState);
-        QTRY_COMPARE(m_handler->closed.size(), 1);
+        QTRY_COMPARE(device.handler.closed.load(), 1);
+        const quint64 badId = device.handler.lastClosed;
 
-        // The well-behaved client is still served on its own, unbroken connection...
-        QCOMPARE(good->call(Operation::GetModules), 0);
-        QCOMPARE(m_handler->closed.size(), 1);
-        // ...whose end is reported in turn, as another connection.
+        // A version mismatch is answered, with why, before the device closes.
+        if (reason.isEmpty()) {
+            FrameDecoder decoder;
+            decoder.feed(received + bad.readAll());
+            Frame refusal;
+            QCOMPARE(decoder.next(&refusal), FrameDecoder::Status::Ready);
+            qint32 result = 0;
+            QString message;
+            PayloadStream(refusal.payload) >> result >> message;
+            QVERIFY2(refusal.requestId == 1 && result == PortlexError::VersionMismatch
+                         && message.contains(QStringLiteral("version %1 ").arg(mismatch))
+                         && message.contains(QStringLiteral("speaks version %1").arg(Protocol::ProtocolVersion)),
+                     qPrintable(message));
+        }
+
+        // The well-behaved client is still served on its own, unbroken connection, whose end
+        // is reported in turn, as another connection.
+        QCOMPARE(ask(*good, Operation::GetModules), 0);
+        QCOMPARE(device.handler.closed.load(), 1);
         good.reset();
-        QTRY_COMPARE(m_handler->closed.size(), 2);
-        QVERIFY(m_handler->closed.at(0) != m_handler->closed.at(1));
+        QTRY_COMPARE(device.handler.closed.load(), 2);
+        QVERIFY(device.handler.lastClosed != badId);
     }
 
-    void socketIsPrivate()
+    void oneClientThroughOutages()
     {
-        QCOMPARE(modeOf(QFileInfo(m_socketPath).absolutePath()), mode_t(0700));
-        QCOMPARE(modeOf(m_socketPath), mode_t(0600));
-
-        FrameServer second(m_handler.get());
-        QVERIFY(!second.listen(m_socketPath));
-        QVERIFY2(second.errorString().contains(QStringLiteral("already listens")), qPrintable(second.errorString()));
-
-        // A socket file nobody listens on any more is replaced.
-        const QString stale = QFileInfo(m_socketPath).absolutePath() + QStringLiteral("/stale");
-        QVERIFY(TestSupport::makeStaleSocket(stale));
-        FrameServer third(m_handler.get());
-        QVERIFY2(third.listen(stale), qPrintable(third.errorString()));
-        Client client(stale);
-        QCOMPARE(client.call(Operation::GetModules), 0);
-
-        // close() takes the socket file away.
-        third.close();
-        QVERIFY(!QFileInfo::exists(stale));
-    }
-
-    void clientSurvivesServerOutages()
-    {
-        Client client(m_socketPath);
-        QCOMPARE(client.call(Operation::GetModules), 0);
+        Device device(m_socketPath);
+        DeviceConnection client(m_socketPath);
+        QByteArray body;
+        QCOMPARE(ask(client, Operation::GetVolumes, 5000, &body), 0);
+        QCOMPARE(body, Answer::success(quint32(7)).body);
+        QCOMPARE(client.displayName() + '|' + client.deviceId(), QStringLiteral("Zantro Simulator - Bench|bench-1"));
+        QCOMPARE(ask(client, Operation::GetRegistry), 3);
+        QCOMPARE(ask(client, Operation(999)), qint32(PortlexError::UnknownOperation));
+        QCOMPARE(device.handler.handled.load(), 2); // the unknown operation never reached the handler
+        QCOMPARE(device.handler.closed.load(), 0);  // all of it over the one connection
 
         // An answer slower than the caller's deadline is a timeout, and the late answer must
         // not be mistaken for the answer to the next request.
-        m_server->setLatency(800);
-        QCOMPARE(client.call(Operation::GetRegistry, nullptr, 200), qint32(PortlexError::Timeout));
-        m_server->setLatency(0);
-        QCOMPARE(client.call(Operation::GetModules), 0);
+        device.onDevice([&] { device.server->setLatency(800); });
+        QCOMPARE(ask(client, Operation::GetRegistry, 200), qint32(PortlexError::Timeout));
+        device.onDevice([&] { device.server->setLatency(0); });
+        QCOMPARE(ask(client, Operation::GetModules), 0);
 
-        m_server->close();
-        QCOMPARE(client.call(Operation::GetModules), qint32(PortlexError::Unreachable));
-        QVERIFY(!client.connection().errorString().isEmpty());
+        // A socket someone listens on is not taken over; close() takes the socket file away.
+        FrameServer second(&device.handler);
+        QVERIFY(!second.listen(m_socketPath));
+        QVERIFY2(second.errorString().contains(QStringLiteral("already listens")), qPrintable(second.errorString()));
+        device.onDevice([&] { device.server->close(); });
+        QVERIFY(!QFileInfo::exists(m_socketPath));
+        QCOMPARE(ask(client, Operation::GetModules), qint32(PortlexError::Unreachable));
+        QVERIFY(!client.errorString().isEmpty());
 
-        FrameServer again(m_handler.get());
-        QVERIFY(again.listen(m_socketPath));
-        QCOMPARE(client.call(Operation::GetModules), 0);
+        device.onDevice([&] { device.listening = device.server->listen(m_socketPath); });
+        QVERIFY(device.listening);
+        QCOMPARE(ask(client, Operation::GetModules), 0);
     }
 
     void clientRefusesAnswersThatDoNotMatch()
     {
+        Device device(m_socketPath);
         // A device of a later protocol generation refuses the handshake and says why.
         const QString refusal = QStringLiteral("Protocol version 1 is not supported; this device speaks version 9");
-        ScriptedDevice newer(m_dir->filePath(QStringLiteral("sockets/newer")), [&](const Frame& hello) {
-            Frame frame = answer(hello, PortlexError::VersionMismatch, refusal);
-            frame.version = 9;
-            return frame;
+        const QString newer = m_folder + QStringLiteral("/newer"), confused = m_folder + QStringLiteral("/confused");
+        device.onDevice([&] {
+            new ScriptedDevice(newer, [refusal](const Frame& hello) {
+                Frame frame = answer(hello, PortlexError::VersionMismatch, refusal);
+                frame.version = 9;
+                return frame;
+            }, device.server);
+            // An answer carrying another request's id is no answer to this one.
+            new ScriptedDevice(confused, [](const Frame& request) {
+                if (request.operation == quint32(Operation::Hello))
+                    return answer(request, 0, QStringLiteral("Confused"), QStringLiteral("confused"));
+                Frame frame = answer(request, 0);
+                frame.requestId = request.requestId - 1;
+                return frame;
+            }, device.server);
         });
-        Client client(newer.fullServerName());
-        QCOMPARE(client.call(Operation::GetModules), qint32(PortlexError::VersionMismatch));
-        QCOMPARE(client.connection().errorString(), refusal);
+        QString error;
+        QCOMPARE(call(newer, Operation::GetModules, &error), qint32(PortlexError::VersionMismatch));
+        QCOMPARE(error, refusal);
+        QCOMPARE(call(confused, Operation::GetModules), qint32(PortlexError::ProtocolError));
+    }
 
-        // An answer carrying another request's id is no answer to this one.
-        ScriptedDevice confused(m_dir->filePath(QStringLiteral("sockets/confused")), [](const Frame& request) {
-            if (request.operation == quint32(Operation::Hello))
-                return answer(request, 0, QStringLiteral("Confused"), QStringLiteral("confused"));
-            Frame frame = answer(request, 0);
-            frame.requestId = request.requestId - 1;
-            return frame;
+    void unreadAnswersStopReading()
+    {
+        constexpr quint32 Requests = 48; // 48 MiB of answers
+        Device device(m_socketPath);
+        const int flooder = connectRaw(m_socketPath);
+        QVERIFY(flooder >= 0);
+        const timeval patience {10, 0};
+        ::setsockopt(flooder, SOL_SOCKET, SO_RCVTIMEO, &patience, sizeof patience);
+        QByteArray flood = helloFrame(Protocol::ProtocolVersion, Protocol::ProtocolVersion);
+        Frame request;
+        request.operation = quint32(Operation::CopyToPCChunk);
+        PayloadStream(&request.payload) << TransferId << Protocol::TransferChunkSize;
+        for (request.requestId = 2; request.requestId <= Requests + 1; ++request.requestId)
+            flood += request.encode();
+        QCOMPARE(::write(flooder, flood.constData(), size_t(flood.size())), ssize_t(flood.size()));
+
+        // The device stops serving the flooder, not everyone: another client's call is
+        // answered, after the device's pass over what the flooder sent.
+        QTRY_VERIFY(device.handler.chunks > 0);
+        QCOMPARE(call(m_socketPath, Operation::GetVolumes), 0);
+        qint64 buffered = 0;
+        device.onDevice([&] { buffered = device.server->bufferedBytes(); });
+        QVERIFY2(device.handler.chunks < int(Requests), qPrintable(QString::number(device.handler.chunks)));
+        QVERIFY2(buffered <= ServerConnection::MaxUnsentBytes + 2 * Protocol::TransferChunkSize,
+                 qPrintable(QStringLiteral("%1 bytes held").arg(buffered)));
+
+        // Once the flooder reads, every answer comes, in order.
+        FrameDecoder decoder;
+        Frame answer;
+        for (quint32 expected = 1; expected <= Requests + 1;) {
+            QByteArray bytes(256 * 1024, Qt::Uninitialized);
+            const ssize_t got = ::read(flooder, bytes.data(), size_t(bytes.size()));
+            QVERIFY2(got > 0, "the device stopped answering");
+            decoder.feed(bytes.left(got));
+            while (decoder.next(&answer) == FrameDecoder::Status::Ready)
+                QCOMPARE(answer.requestId, expected++);
+        }
+        ::close(flooder);
+    }
+
+    void connectionsBeyondTheLimitRefused()
+    {
+        Device device(m_socketPath, 2);
+        const int first = connectRaw(m_socketPath), second = connectRaw(m_socketPath);
+        QVERIFY(first >= 0 && second >= 0);
+        QTest::ignoreMessage(QtWarningMsg, QRegularExpression(QStringLiteral("Refusing new connections.*limit")));
+        QCOMPARE(call(m_socketPath, Operation::GetVolumes), qint32(PortlexError::Unreachable));
+        ::close(first);
+        QTRY_COMPARE(device.handler.closed.load(), 1); // the refused one never became a connection
+        QTest::ignoreMessage(QtWarningMsg, QRegularExpression(QStringLiteral("again, after refusing 1")));
+        QCOMPARE(call(m_socketPath, Operation::GetVolumes), 0);
+        ::close(second);
+    }
+
+    void outOfDescriptorsKeepsListening()
+    {
+        Device device(m_socketPath);
+        rlimit saved {};
+        QVERIFY(::getrlimit(RLIMIT_NOFILE, &saved) == 0);
+        int highest = 0;
+        for (const QString& fd : QDir(QStringLiteral("/proc/self/fd")).entryList(QDir::AllEntries | QDir::System | QDir::NoDotAndDotDot))
+            highest = std::max(highest, fd.toInt());
+        // Hold the device while this process's descriptors run out, so that its next accept fails.
+        QSemaphore entered, gate;
+        device.onDevice([&] { entered.release(); gate.acquire(); }, Qt::QueuedConnection);
+        entered.acquire();
+        bool held = true;
+        const auto restore = qScopeGuard([&] {
+            if (held)
+                gate.release();
+            ::setrlimit(RLIMIT_NOFILE, &saved);
         });
-        Client mixedUp(confused.fullServerName());
-        QCOMPARE(mixedUp.call(Operation::GetModules), qint32(PortlexError::ProtocolError));
+        rlimit lowered = saved;
+        lowered.rlim_cur = rlim_t(highest + 16);
+        QVERIFY(::setrlimit(RLIMIT_NOFILE, &lowered) == 0);
+        std::vector<int> clients;
+        for (int fd; (fd = connectRaw(m_socketPath)) >= 0;)
+            clients.push_back(fd);
+        QCOMPARE(errno, EMFILE);
+
+        QTest::ignoreMessage(QtWarningMsg, QRegularExpression(QStringLiteral("Refusing new connections.*out of file descriptors")));
+        gate.release();
+        held = false;
+        // Every waiting client is closed at once rather than left waiting for a handshake.
+        char byte;
+        QTRY_VERIFY(std::all_of(clients.begin(), clients.end(), [&](int fd) { return ::recv(fd, &byte, 1, MSG_DONTWAIT) == 0; }));
+        for (const int fd : clients)
+            ::close(fd);
+        QVERIFY(::setrlimit(RLIMIT_NOFILE, &saved) == 0);
+        QTest::ignoreMessage(QtWarningMsg, QRegularExpression(QStringLiteral("again, after refusing")));
+        QCOMPARE(call(m_socketPath, Operation::GetVolumes), 0);
+    }
+
+    void hungDeviceCostsOneTimeout_data()
+    {
+        QTest::addColumn<int>("action");
+        QTest::newRow("copy to the PC") << 0;
+        QTest::newRow("copy to the device") << 1;
+        QTest::newRow("install a package") << 2;
+    }
+
+    void hungDeviceCostsOneTimeout()
+    {
+        QFETCH(int, action);
+        DeviceConnection::setCallTimeoutMs(300);
+        Device device(m_socketPath);
+        QList<QPair<QString, QString>> devices;
+        QCOMPARE(Portlex::GetDevices(devices), 1u);
+        const QSharedPointer<_ZantDevice> zant = Portlex::GetDevice(QStringLiteral("bench-1"));
+        QVERIFY(Portlex::ConnectDevice(zant, QString(), QString()));
+        const QString local = m_dir->filePath(QStringLiteral("local.zantro"));
+        QVERIFY(writeFile(local, randomBytes(qsizetype(CopySize), 5)));
+
+        // The device stops answering in the middle of the transfer.
+        device.handler.hangAtChunk = 2;
+        const int result = action == 0 ? zant->CopyFileToPC(QStringLiteral("/user/big.bin"), m_dir->filePath(QStringLiteral("copy")))
+            : action == 1              ? zant->CopyFileToDevice(local, QStringLiteral("/user/big.bin"))
+                                       : zant->InstallPackage(local, 1);
+        QCOMPARE(result, int(PortlexError::Timeout));
+        device.handler.hung.release();
+
+        // No clean-up call went after the timeout: the next caller's connection is the first
+        // the device has seen since the transfer's.
+        QCOMPARE(call(m_socketPath, Operation::GetVolumes), 0);
+        QCOMPARE(device.handler.lastConnection.load(), device.handler.transferConnection + 1);
+    }
+
+    void stillWorkingRenewsTheDeadline_data()
+    {
+        QTest::addColumn<int>("keepAlives");
+        QTest::addColumn<int>("silenceMs");
+        QTest::addColumn<qint32>("expected");
+        // The call allows 400 ms of silence.
+        QTest::newRow("notices all through 800 ms of work") << 16 << 0 << 0;
+        QTest::newRow("silence after a few notices") << 3 << 1200 << qint32(PortlexError::Timeout);
+    }
+
+    void stillWorkingRenewsTheDeadline()
+    {
+        QFETCH(int, keepAlives);
+        QFETCH(int, silenceMs);
+        QFETCH(qint32, expected);
+        Device device(m_socketPath);
+        device.handler.keepAlives = keepAlives;
+        device.handler.silenceMs = silenceMs;
+        DeviceConnection connection(m_socketPath);
+        QByteArray body;
+        QCOMPARE(ask(connection, Operation::RunApplication, 400, &body), expected);
+        if (expected != 0)
+            return;
+        QCOMPARE(body, Answer::success(QStringLiteral("done")).body);
+        // The notices left the connection in step for the next call.
+        const quint64 served = device.handler.lastConnection;
+        QCOMPARE(ask(connection, Operation::GetVolumes), 0);
+        QCOMPARE(device.handler.lastConnection.load(), served);
+    }
+
+    void socketPlaceChecked_data()
+    {
+        QTest::addColumn<int>("place"); // what is there before the device starts
+        QTest::addColumn<int>("mode");  // of the socket folder
+        QTest::addColumn<qint32>("client");
+        const qint32 untrusted = PortlexError::Untrusted, unreachable = PortlexError::Unreachable;
+        QTest::newRow("missing folder, created private") << int(Missing) << 0700 << 0;
+        QTest::newRow("folder others may read") << int(Folder) << 0755 << 0;
+        QTest::newRow("world-writable folder") << int(Folder) << 0777 << untrusted;
+        QTest::newRow("group-writable folder") << int(Folder) << 0770 << untrusted;
+        QTest::newRow("shared, sticky folder") << int(Folder) << 01777 << untrusted;
+        QTest::newRow("folder reached through a link") << int(Link) << 0700 << untrusted;
+        QTest::newRow("another user's folder") << int(Foreign) << 0700 << untrusted;
+        QTest::newRow("regular file at the socket path") << int(File) << 0700 << unreachable;
+        QTest::newRow("symlink at the socket path") << int(FileLink) << 0700 << unreachable;
+        QTest::newRow("directory at the socket path") << int(Directory) << 0700 << unreachable;
+        QTest::newRow("stale socket, replaced") << int(StaleSocket) << 0700 << 0;
+        QTest::newRow("another user's device at the socket path") << int(ForeignPeer) << 0700 << untrusted;
+    }
+
+    void socketPlaceChecked()
+    {
+        QFETCH(int, place);
+        QFETCH(int, mode);
+        QFETCH(qint32, client);
+        if ((place == Foreign || place == ForeignPeer) && ::geteuid() != 0)
+            QSKIP("acting as another user needs root");
+        const QByteArray folder = QFile::encodeName(m_folder);
+        const QString target = m_dir->filePath(QStringLiteral("target"));
+        QVERIFY(place == Missing || (QDir().mkpath(m_folder) && ::chmod(folder.constData(), mode_t(mode)) == 0));
+        QVERIFY(place != Foreign || ::chown(folder.constData(), 65534, 65534) == 0);
+        QVERIFY(place != Link || QFile::link(m_folder, m_dir->filePath(QStringLiteral("link"))));
+        QVERIFY(place != File || writeFile(m_socketPath, "keep me"));
+        QVERIFY(place != FileLink || (writeFile(target, "keep me") && QFile::link(target, m_socketPath)));
+        QVERIFY(place != Directory || QDir().mkpath(m_socketPath + QStringLiteral("/inside")));
+        QVERIFY(place != StaleSocket || makeStaleSocket(m_socketPath));
+        const int listener = place == ForeignPeer ? listenRaw(m_socketPath, 65534) : -1;
+        const auto closeListener = qScopeGuard([listener] { ::close(listener); });
+        QVERIFY(place != ForeignPeer || listener >= 0);
+        const QString socketPath = place == Link ? m_dir->filePath(QStringLiteral("link/bench-1")) : m_socketPath;
+        const QByteArray before = treeDigest(m_dir->path());
+
+        // The device refuses the place and says where; the client will not even connect
+        // through an unsafe folder; nothing there is changed, the folder's mode included.
+        Device device(socketPath);
+        QString error;
+        QCOMPARE(call(socketPath, Operation::GetVolumes, &error), client);
+        QCOMPARE(modeOf(m_folder), mode_t(mode));
+        if (client == 0) {
+            QVERIFY2(device.listening, qPrintable(device.error));
+            QCOMPARE(modeOf(socketPath), mode_t(0600));
+            return;
+        }
+        QVERIFY(!device.listening);
+        const QString named = place >= File ? socketPath : QFileInfo(socketPath).path();
+        QVERIFY2(device.error.contains(named), qPrintable(device.error));
+        QVERIFY2(client != PortlexError::Untrusted || error.contains(named), qPrintable(error));
+        QCOMPARE(treeDigest(m_dir->path()), before);
+        if (place == ForeignPeer) { // the client went without a word: the connection ends before any byte
+            const int peer = ::accept(listener, nullptr, nullptr);
+            char byte;
+            QCOMPARE(::recv(peer, &byte, 1, MSG_DONTWAIT), ssize_t(0));
+            ::close(peer);
+        }
     }
 };
 

@@ -1,22 +1,30 @@
+#include "DeviceConnection.h"
+#include "PackageWriter.h"
 #include "Portlex.h"
 #include "PortlexErrors.h"
 #include "SimulatorProcess.h"
 #include "TestImage.h"
 #include "TestSupport.h"
 
+#include <QProcess>
+#include <QRegularExpression>
 #include <QTemporaryDir>
 #include <QThread>
 #include <QtTest>
 
 #include <atomic>
+#include <functional>
 #include <memory>
 
-using TestSupport::callOnWorker;
+using namespace TestSupport;
 
 namespace {
 
 const QString Name = QStringLiteral("Zantro Simulator - Test");
+const QString DeviceId = QStringLiteral("test-dev");
 constexpr int HangLimitMs = 4 * Protocol::CallTimeoutMs;
+constexpr quint64 LargeVolume = 1024ull * 1024 * 1024;
+const QStringList SlowAnswers { QStringLiteral("--latency"), QStringLiteral("100") };
 
 template <typename List, typename Field, typename Value>
 bool anyHas(const List& list, Field field, const Value& value)
@@ -24,40 +32,95 @@ bool anyHas(const List& list, Field field, const Value& value)
     return std::any_of(list.cbegin(), list.cend(), [&](const auto& item) { return item.*field == value; });
 }
 
+// The device's temporary files below root.
+QStringList leftovers(const QString& root)
+{
+    return treeEntries(root).filter(QRegularExpression(QStringLiteral("(^|/)\\.zantro-")));
+}
+
+// True while this process holds a file open in folder, named or not.
+bool writesInto(const QString& folder)
+{
+    const QString prefix = QFileInfo(folder).canonicalFilePath() + QLatin1Char('/');
+    const QDir fds(QStringLiteral("/proc/self/fd"));
+    const QStringList open = fds.entryList(QDir::System | QDir::Files | QDir::NoDotAndDotDot);
+    return std::any_of(open.cbegin(), open.cend(),
+                       [&](const QString& fd) { return QFile::symLinkTarget(fds.filePath(fd)).startsWith(prefix); });
+}
+
 } // namespace
 
-// The client against real zantro-sim processes serving copies of a TestImage.
+// The client against real zantro-sim processes serving a TestImage: discovery, queries,
+// threads, devices that die or stop, and the actions that change a device's files. A canary
+// beside the image, which links inside the volume lead to, is never touched.
 class PortlexTest : public QObject
 {
     Q_OBJECT
 
-    std::unique_ptr<QTemporaryDir> m_dir;
+    std::unique_ptr<QTemporaryDir> m_sockets;
     std::unique_ptr<TestImage> m_image;
-    QString m_sockets;
+    std::unique_ptr<SimulatorProcess> m_simulator;
+    std::unique_ptr<QTemporaryDir> m_local;
+    QByteArray m_canaryDigest;
 
-    QSharedPointer<_ZantDevice> connected(SimulatorProcess& simulator, const QString& id, const QStringList& arguments = {})
+    // Serves m_image in place (so that tests see its files) with a flash volume of the
+    // given size, and connects to it.
+    QSharedPointer<_ZantDevice> serve(quint64 volumeSize = LargeVolume, const QStringList& arguments = {})
     {
-        return simulator.connectDevice(m_image->path(), id, arguments);
+        QByteArray profile = TestImage::defaultProfile();
+        m_image->writeProfile(profile.replace("size=\"1000000\"", "size=\"" + QByteArray::number(volumeSize) + '"'));
+        m_simulator = std::make_unique<SimulatorProcess>(m_sockets->path());
+        return m_simulator->connectDevice(m_image->path(), DeviceId, arguments, SimulatorProcess::Image::InPlace);
+    }
+    QString flash(const QString& relative = QString()) const { return m_image->path() + QStringLiteral("/flash/") + relative; }
+    QString local(const QString& name) const { return m_local->filePath(name); }
+    QString canary() const { return m_image->outside() + QStringLiteral("/canary"); }
+    QString makePackage(const QString& name, const QString& entry, const QByteArray& bytes) const
+    {
+        PackageWriter writer;
+        return writer.open(local(name)) && writer.addFile(entry, bytes) && writer.close() ? local(name) : QString();
+    }
+    // Runs a transfer on a worker thread and kills the device once inFlight() holds: true
+    // when that happened and the transfer then ended, with an error.
+    bool cutByKill(const std::function<int()>& transfer, const std::function<bool()>& inFlight)
+    {
+        std::atomic<int> result { 0 };
+        std::unique_ptr<QThread> worker(QThread::create([&] { result = transfer(); }));
+        worker->start();
+        const bool started = QTest::qWaitFor(inFlight, 20000);
+        m_simulator->kill();
+        return worker->wait(30000) && started && result != 0;
     }
 
 private slots:
     void init()
     {
         QVERIFY2(QFileInfo::exists(SimulatorProcess::executable()), "zantro-sim is not built");
-        m_dir = std::make_unique<QTemporaryDir>();
-        m_sockets = m_dir->filePath(QStringLiteral("sockets"));
-        QVERIFY(QDir().mkpath(m_sockets));
-        qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_sockets));
+        m_sockets = std::make_unique<QTemporaryDir>();
+        qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_sockets->path()));
+        m_local = std::make_unique<QTemporaryDir>();
         m_image = std::make_unique<TestImage>();
         m_image->fillDefault();
+        m_image->writeFile(QStringLiteral("flash/user/docs/a.txt"), "alpha");
+        m_image->writeFile(QStringLiteral("flash/user/docs/deep/b.txt"), "beta");
+        QVERIFY(writeFile(canary() + QStringLiteral("/secret.txt"), "do not touch"));
+        QVERIFY(writeFile(canary() + QStringLiteral("/inner/app.mod"), "outside module"));
+        QVERIFY(QFile::link(canary(), flash(QStringLiteral("user/out"))));
+        QVERIFY(QFile::link(canary() + QStringLiteral("/secret.txt"), flash(QStringLiteral("user/outfile"))));
+        QVERIFY(QFile::link(canary(), flash(QStringLiteral("user/docs/deep/escape"))));
+        m_canaryDigest = treeDigest(canary());
         Portlex::Initialize();
     }
 
     void cleanup()
     {
+        QCOMPARE(treeDigest(canary()), m_canaryDigest);
         Portlex::Destroy();
+        DeviceConnection::setCallTimeoutMs(Protocol::CallTimeoutMs);
+        m_simulator.reset();
         m_image.reset();
-        m_dir.reset();
+        m_local.reset();
+        m_sockets.reset();
     }
 
     void discovery()
@@ -66,11 +129,11 @@ private slots:
         QCOMPARE(Portlex::GetDevices(devices), 0u);
         QVERIFY(devices.isEmpty());
         // Neither a socket nobody listens on nor a plain file is a device.
-        QVERIFY(TestSupport::makeStaleSocket(m_sockets + QStringLiteral("/crashed.sock")));
-        QVERIFY(TestSupport::writeFile(m_sockets + QStringLiteral("/notes.txt"), "note"));
+        QVERIFY(makeStaleSocket(m_sockets->filePath(QStringLiteral("crashed.sock"))));
+        QVERIFY(writeFile(m_sockets->filePath(QStringLiteral("notes.txt")), "note"));
         QCOMPARE(Portlex::GetDevices(devices), 0u);
 
-        SimulatorProcess first(m_sockets), second(m_sockets);
+        SimulatorProcess first(m_sockets->path()), second(m_sockets->path());
         QVERIFY2(first.start(m_image->path(), QStringLiteral("dev-a")), qPrintable(first.errorString()));
         QVERIFY2(second.start(m_image->path(), QStringLiteral("dev-b")), qPrintable(second.errorString()));
         QCOMPARE(Portlex::GetDevices(devices), 2u);
@@ -88,12 +151,12 @@ private slots:
         QVERIFY(!Portlex::GetDevice(QStringLiteral("dev-b")).isNull());
     }
 
-    void connectAndRefusedConnect()
+    void refusedConnect()
     {
         QVERIFY(!Portlex::ConnectDevice(QSharedPointer<_ZantDevice>(), QString(), QString()));
         QCOMPARE(Portlex::LastError(), unsigned(PortlexError::InvalidArgument));
 
-        SimulatorProcess refusing(m_sockets);
+        SimulatorProcess refusing(m_sockets->path());
         QVERIFY(refusing.start(m_image->path(), QStringLiteral("locked"),
                                { QStringLiteral("--refuse-connect"), QStringLiteral("77:Handset locked by operator") }));
         QList<QPair<QString, QString>> devices;
@@ -103,8 +166,7 @@ private slots:
         QVERIFY(!Portlex::ConnectDevice(device, QString(), QString()));
         QCOMPARE(Portlex::LastError(), 77u);
         QCOMPARE(Portlex::LastStatus(), QStringLiteral("Handset locked by operator"));
-        QVERIFY(!device->Connected());
-        QVERIFY(!device->cache.filled);
+        QVERIFY(!device->Connected() && !device->cache.filled);
         QVector<ModuleInfo> modules;
         QCOMPARE(device->GetModules(modules, nullptr, nullptr), int(PortlexError::NotConnected));
 
@@ -113,55 +175,48 @@ private slots:
         QVERIFY(!Portlex::ConnectDevice(device, QString(), QString()));
         QCOMPARE(Portlex::LastError(), unsigned(PortlexError::Unreachable));
         QVERIFY(!Portlex::LastStatus().isEmpty());
-
-        SimulatorProcess simulator(m_sockets);
-        const QSharedPointer<_ZantDevice> good = connected(simulator, QStringLiteral("good"));
-        QVERIFY(good && good->Connected());
-        QVERIFY(!good->statusText.isEmpty());
-        QVERIFY(good->cache.filled);
-        QCOMPARE(good->cache.deviceData.phoneName, QStringLiteral("Test Phone"));
-        QVERIFY(good->cache.classes.contains(QStringLiteral("0x01011001")));
     }
 
-    // Each query's operation and record reach the right output.
+    // Each query's operation and record reach the right output; a --fail code surfaces
+    // unchanged and leaves the output as it was.
     void everyQuery()
     {
-        SimulatorProcess simulator(m_sockets);
-        const QSharedPointer<_ZantDevice> device = connected(simulator, QStringLiteral("known"));
-        QVERIFY(device);
+        const QSharedPointer<_ZantDevice> device
+            = serve(LargeVolume, { QStringLiteral("--fail"), QStringLiteral("GetChildSettings:/appinfo=0xDEADBEEF") });
+        QVERIFY(device && device->Connected() && device->cache.filled);
+        QVERIFY(!device->statusText.isEmpty());
+        QCOMPARE(device->cache.deviceData.phoneName, QStringLiteral("Test Phone"));
+        QVERIFY(device->cache.classes.contains(QStringLiteral("0x01011001")));
 
         QVector<ModuleInfo> modules;
-        QCOMPARE(device->GetModules(modules, nullptr, nullptr), 0);
-        QVERIFY(anyHas(modules, &ModuleInfo::path, QStringLiteral("/usermod/userm/userm.mif")));
-        MifEntry mif;
+        QVERIFY(device->GetModules(modules, nullptr, nullptr) == 0
+                && anyHas(modules, &ModuleInfo::path, QStringLiteral("/usermod/userm/userm.mif")));
+        MifEntry mif, untouched;
         QCOMPARE(device->GetModuleMif(QStringLiteral("/usermod/userm/userm.mif"), mif), 0);
         QCOMPARE(mif.classes, QVector<quint32>({ 0x01013001, 0x7F000001 }));
-        MifEntry untouched;
         untouched.fileName = QStringLiteral("kept");
         QCOMPARE(device->GetModuleMif(QStringLiteral("/usermod/none/none.mif"), untouched), int(PortlexError::NotFound));
         QCOMPARE(untouched.fileName, QStringLiteral("kept"));
 
         QVector<ProcessInfo> processes;
-        QCOMPARE(device->GetProcesses(processes), 0);
-        QVERIFY(anyHas(processes, &ProcessInfo::name, QStringLiteral("Kernel")));
+        QVERIFY(device->GetProcesses(processes) == 0 && anyHas(processes, &ProcessInfo::name, QStringLiteral("Kernel")));
         QVector<LoadedModuleInfo> loaded;
-        QCOMPARE(device->GetLoadedModules(loaded), 0);
-        QVERIFY(std::any_of(loaded.cbegin(), loaded.cend(),
-                            [](const LoadedModuleInfo& p) { return anyHas(p.modules, &LoadedModuleEntry::location, QStringLiteral("/sys/k.bin")); }));
+        QVERIFY(device->GetLoadedModules(loaded) == 0 && !loaded.isEmpty()
+                && anyHas(loaded.first().modules, &LoadedModuleEntry::location, QStringLiteral("/sys/k.bin")));
         QSet<VolumeInfo> volumes;
-        QCOMPARE(device->GetVolumes(volumes), 0);
-        QVERIFY(anyHas(volumes, &VolumeInfo::friendlyName, QStringLiteral("Card")));
+        QVERIFY(device->GetVolumes(volumes) == 0 && anyHas(volumes, &VolumeInfo::friendlyName, QStringLiteral("Card")));
         QVector<RegistryInfo> registry;
-        QCOMPARE(device->GetRegistry(registry, nullptr, nullptr), 0);
-        QVERIFY(anyHas(registry, &RegistryInfo::mimeType, QStringLiteral("image/png")));
+        QVERIFY(device->GetRegistry(registry, nullptr, nullptr) == 0 && anyHas(registry, &RegistryInfo::mimeType, QStringLiteral("image/png")));
         QVector<PriviledgeRecord> privileges;
-        QCOMPARE(device->GetTepSigPrivs(privileges), 0);
-        QVERIFY(anyHas(privileges, &PriviledgeRecord::id, QStringLiteral("0x12345678")));
+        QVERIFY(device->GetTepSigPrivs(privileges) == 0 && anyHas(privileges, &PriviledgeRecord::id, QStringLiteral("0x12345678")));
 
-        auto calc = QSharedPointer<_SettingsInfo>::create();
-        calc->SetPath(QStringLiteral("/appinfo/calc"));
-        QCOMPARE(device->GetChildSettings(calc), 0);
-        QCOMPARE(calc->values, (QVector<QPair<QString, QString>> { { QStringLiteral("version"), QStringLiteral("1.0") } }));
+        auto node = QSharedPointer<_SettingsInfo>::create();
+        node->SetPath(QStringLiteral("/appinfo"));
+        QCOMPARE(device->GetChildSettings(node), int(0xDEADBEEF));
+        QVERIFY(node->children.isEmpty());
+        node->SetPath(QStringLiteral("/appinfo/calc"));
+        QCOMPARE(device->GetChildSettings(node), 0);
+        QCOMPARE(node->values, (QVector<QPair<QString, QString>> { { QStringLiteral("version"), QStringLiteral("1.0") } }));
         QSharedPointer<_SettingsInfo> none;
         QCOMPARE(device->GetChildSettings(none), int(PortlexError::InvalidArgument));
 
@@ -177,12 +232,16 @@ private slots:
         QCOMPARE(device->TepStatus(mode, owner, expiry), EnablementEnabled);
         QCOMPARE(owner, QStringLiteral("Tester"));
         QVERIFY(device->GlobalTestSigStatus(mode, owner, expiry) != EnablementEnabled);
+        // A lock request rides on the next call, whichever thread makes it, and is then cleared.
+        device->serviceLockRequest = true;
+        QCOMPARE(callOnWorker([&] { return device->GetVolumes(volumes); }, HangLimitMs), 0);
+        QVERIFY(!device->serviceLockRequest);
+        QCOMPARE(device->TepStatus(mode, owner, expiry), EnablementDisabled);
     }
 
     void eightThreadsShareOneDevice()
     {
-        SimulatorProcess simulator(m_sockets);
-        const QSharedPointer<_ZantDevice> device = connected(simulator, QStringLiteral("busy"));
+        const QSharedPointer<_ZantDevice> device = serve();
         QVERIFY(device);
         QVector<ModuleInfo> reference;
         QCOMPARE(device->GetModules(reference, nullptr, nullptr), 0);
@@ -197,11 +256,10 @@ private slots:
                     auto node = QSharedPointer<_SettingsInfo>::create();
                     node->SetPath(QStringLiteral("/appinfo"));
                     QString mode, owner, expiry;
-                    const bool ok = (t % 2 == 0 ? device->GetModules(modules, nullptr, nullptr) == 0 && modules == reference
-                                                : device->GetVolumes(volumes) == 0 && volumes.size() == 2)
-                        && device->GetChildSettings(node) == 0 && node->children.size() == 2
-                        && device->TepStatus(mode, owner, expiry) == EnablementEnabled;
-                    failures += !ok;
+                    failures += (t % 2 == 0 ? device->GetModules(modules, nullptr, nullptr) != 0 || modules != reference
+                                            : device->GetVolumes(volumes) != 0 || volumes.size() != 2)
+                        || device->GetChildSettings(node) != 0 || node->children.size() != 2
+                        || device->TepStatus(mode, owner, expiry) != EnablementEnabled;
                 }
             }));
             threads.back()->start();
@@ -218,9 +276,7 @@ private slots:
 
     void simulatorKilledAndRestarted()
     {
-        SimulatorProcess simulator(m_sockets);
-        const QSharedPointer<_ZantDevice> device = connected(simulator, QStringLiteral("fragile"),
-                                                             { QStringLiteral("--latency"), QStringLiteral("1500") });
+        const QSharedPointer<_ZantDevice> device = serve(LargeVolume, { QStringLiteral("--latency"), QStringLiteral("1500") });
         QVERIFY(device);
 
         // A call in flight when the device dies ends with an error, not a hang. Nothing shows
@@ -235,26 +291,35 @@ private slots:
         worker->start();
         QTRY_VERIFY(calling);
         QTest::qWait(300);
-        simulator.kill();
+        m_simulator->kill();
         QVERIFY(worker->wait(2 * Protocol::CallTimeoutMs));
         QCOMPARE(result.load(), int(PortlexError::Unreachable));
 
+        // Lock requests made while the device is away wait for the call that reaches it.
+        device->serviceLockRequest = true;
+        device->signatureLockRequest = true;
         QVector<ModuleInfo> modules;
         const auto getModules = [&] { return device->GetModules(modules, nullptr, nullptr); };
         QCOMPARE(getModules(), int(PortlexError::Unreachable));
         QCOMPARE(callOnWorker(getModules, HangLimitMs), int(PortlexError::Unreachable));
-        QVERIFY2(simulator.start(m_image->path(), QStringLiteral("fragile")), qPrintable(simulator.errorString()));
+        QVERIFY(device->serviceLockRequest && device->signatureLockRequest);
+
+        QByteArray profile = TestImage::defaultProfile();
+        m_image->writeProfile(profile.replace("mode=\"service\"", "mode=\"signature\""));
+        QVERIFY2(m_simulator->start(m_image->path(), DeviceId, {}, SimulatorProcess::Image::InPlace), qPrintable(m_simulator->errorString()));
         QCOMPARE(getModules(), 0);
-        QVERIFY(!modules.isEmpty());
+        QVERIFY(!modules.isEmpty() && !device->serviceLockRequest && !device->signatureLockRequest);
         QCOMPARE(callOnWorker(getModules, HangLimitMs), 0);
+        QString mode, owner, expiry;
+        QCOMPARE(device->GlobalTestSigStatus(mode, owner, expiry), EnablementDisabled);
     }
 
     void stoppedSimulatorTimesOut()
     {
-        SimulatorProcess simulator(m_sockets);
-        const QSharedPointer<_ZantDevice> device = connected(simulator, QStringLiteral("sleepy"));
+        DeviceConnection::setCallTimeoutMs(1000);
+        const QSharedPointer<_ZantDevice> device = serve();
         QVERIFY(device);
-        simulator.pause();
+        m_simulator->pause();
         // A fresh connection (another thread) gets no further than the handshake, and the
         // call leaves its output as it was.
         QVector<ModuleInfo> kept { ModuleInfo() };
@@ -263,64 +328,236 @@ private slots:
         QList<QPair<QString, QString>> devices;
         QCOMPARE(Portlex::GetDevices(devices), 0u);
 
-        simulator.resume();
+        m_simulator->resume();
         QCOMPARE(device->GetModules(kept, nullptr, nullptr), 0);
         QCOMPARE(Portlex::GetDevices(devices), 1u);
     }
 
-    void failCodesSurface()
+    // Byte-exact both ways around the chunk size and through the pipeline; each copy
+    // replaces the one before.
+    void copiesBothWays()
     {
-        SimulatorProcess simulator(m_sockets);
-        const QSharedPointer<_ZantDevice> device = connected(
-            simulator, QStringLiteral("failing"),
-            { QStringLiteral("--fail"), QStringLiteral("GetRegistry=3"), QStringLiteral("--fail"),
-              QStringLiteral("GetChildSettings:/appinfo=0xDEADBEEF") });
+        const QSharedPointer<_ZantDevice> device = serve();
         QVERIFY(device);
-
-        QVector<RegistryInfo> registry { RegistryInfo() };
-        QCOMPARE(device->GetRegistry(registry, nullptr, nullptr), 3);
-        QCOMPARE(registry.size(), 1);
-        auto appinfo = QSharedPointer<_SettingsInfo>::create();
-        appinfo->SetPath(QStringLiteral("/appinfo"));
-        QCOMPARE(device->GetChildSettings(appinfo), int(0xDEADBEEF));
-        QVERIFY(appinfo->children.isEmpty());
-        auto calc = QSharedPointer<_SettingsInfo>::create();
-        calc->SetPath(QStringLiteral("/appinfo/calc"));
-        QCOMPARE(device->GetChildSettings(calc), 0);
+        for (const QByteArray& bytes : { QByteArray(), QByteArray("x"), randomBytes(Protocol::TransferChunkSize, 1),
+                                         randomBytes(Protocol::TransferChunkSize + 1, 2), randomBytes(20 * 1024 * 1024 + 7, 3) }) {
+            QVERIFY(writeFile(local(QStringLiteral("source.bin")), bytes));
+            QCOMPARE(device->CopyFileToDevice(local(QStringLiteral("source.bin")), QStringLiteral("/user/copied.bin")), 0);
+            QCOMPARE(readFile(flash(QStringLiteral("user/copied.bin"))), bytes);
+            QCOMPARE(device->CopyFileToPC(QStringLiteral("/user/copied.bin"), local(QStringLiteral("back.bin"))), 0);
+            QCOMPARE(readFile(local(QStringLiteral("back.bin"))), bytes);
+            QCOMPARE(leftovers(flash()), QStringList());
+            // The device's listing shows the file with its size.
+            QSharedPointer<_DirectoryInfo> level;
+            QCOMPARE(device->GetFileSystemLevel(QStringLiteral("/user"), level, nullptr, nullptr), 0);
+            QVERIFY(std::any_of(level->files.cbegin(), level->files.cend(), [&](const QSharedPointer<_FileInfo>& f) {
+                return f->Name() == QLatin1String("copied.bin") && f->size == quint64(bytes.size());
+            }));
+        }
     }
 
-    // A lock request rides on the next call that reaches the device, whichever thread makes it.
-    void lockRequestsReachTheDevice()
+    void failuresChangeNothing()
     {
-        SimulatorProcess simulator(m_sockets);
-        const QSharedPointer<_ZantDevice> device = connected(simulator, QStringLiteral("service"));
+        const QSharedPointer<_ZantDevice> device = serve(2 * 1024 * 1024);
         QVERIFY(device);
-        QString mode, owner, expiry;
-        QCOMPARE(device->TepStatus(mode, owner, expiry), EnablementEnabled);
-
-        // A request made while the device is away waits for the call that reaches it.
-        simulator.kill();
-        device->serviceLockRequest = true;
-        QVector<ModuleInfo> modules;
-        QCOMPARE(device->GetModules(modules, nullptr, nullptr), int(PortlexError::Unreachable));
-        QVERIFY(device->serviceLockRequest);
-        QVERIFY(simulator.start(m_image->path(), QStringLiteral("service")));
-        QCOMPARE(device->GetModules(modules, nullptr, nullptr), 0);
-        QVERIFY(!device->serviceLockRequest);
-        QCOMPARE(device->TepStatus(mode, owner, expiry), EnablementDisabled);
-
-        QByteArray profile = TestImage::defaultProfile();
-        m_image->writeProfile(profile.replace("mode=\"service\"", "mode=\"signature\""));
-        SimulatorProcess signing(m_sockets);
-        const QSharedPointer<_ZantDevice> signedDevice = connected(signing, QStringLiteral("signed"));
-        QVERIFY(signedDevice);
-        QCOMPARE(signedDevice->GlobalTestSigStatus(mode, owner, expiry), EnablementEnabled);
-        QVERIFY(signedDevice->TepStatus(mode, owner, expiry) != EnablementEnabled);
-        signedDevice->signatureLockRequest = true;
         QSet<VolumeInfo> volumes;
-        QCOMPARE(callOnWorker([&] { return signedDevice->GetVolumes(volumes); }, HangLimitMs), 0);
-        QVERIFY(!signedDevice->signatureLockRequest);
-        QCOMPARE(signedDevice->GlobalTestSigStatus(mode, owner, expiry), EnablementDisabled);
+        QCOMPARE(device->GetVolumes(volumes), 0);
+        int free = 0;
+        for (const VolumeInfo& volume : std::as_const(volumes))
+            free = volume.volumeId == 1 ? int(volume.freeSpace) : free;
+        QVERIFY(free > 0);
+
+        QVERIFY(writeFile(local(QStringLiteral("fits.bin")), QByteArray(free, 'f')));
+        QVERIFY(writeFile(local(QStringLiteral("toobig.bin")), QByteArray(free + 1, 'g')));
+        const QByteArray before = treeDigest(flash());
+        const auto toDevice = [&](const char* from, const char* to) {
+            return device->CopyFileToDevice(local(QLatin1String(from)), QLatin1String(to));
+        };
+        QCOMPARE(toDevice("toobig.bin", "/user/big.bin"), int(PortlexError::NoSpace));
+        QCOMPARE(toDevice("fits.bin", "/user/docs"), int(PortlexError::IsDirectory));
+        QCOMPARE(toDevice("missing.bin", "/user/m.bin"), int(PortlexError::LocalFileError));
+        QCOMPARE(toDevice("fits.bin", "/nowhere/m.bin"), int(PortlexError::NotFound));
+        QCOMPARE(treeDigest(flash()), before);
+        QCOMPARE(toDevice("fits.bin", "/user/fits.bin"), 0);
+
+        const auto toPC = [&](const char* from, const char* to) { return device->CopyFileToPC(QLatin1String(from), local(QLatin1String(to))); };
+        QCOMPARE(toPC("/user/none.txt", "none.txt"), int(PortlexError::NotFound));
+        QCOMPARE(toPC("/user/docs", "docs"), int(PortlexError::IsDirectory));
+        QCOMPARE(toPC("/user/notes.txt", "no/such/folder/n.txt"), int(PortlexError::LocalFileError));
+        QCOMPARE(treeEntries(m_local->path()), QStringList({ "fits.bin", "toobig.bin" }));
+        // Each failure left the connection fit for the next call.
+        QCOMPARE(toPC("/user/notes.txt", "n.txt"), 0);
+        QCOMPARE(readFile(local(QStringLiteral("n.txt"))), QByteArray("hello"));
+
+        // Why a package is refused is PackageExtractor's matter; here: the device's room decides
+        // at the start and while unpacking, the refusal reaches the caller with its reason, and
+        // the image stays as it was. Random bytes do not compress: this package itself is larger
+        // than the room left.
+        const QString large = makePackage(QStringLiteral("large.zantro"), QStringLiteral("l/l.mif"), randomBytes(3 << 20, 9));
+        // A 1 MiB package that unpacks to 4 MiB, beyond the room left.
+        const QString unpacksLarge = makePackage(QStringLiteral("4x.zantro"), QStringLiteral("t/t.mif"),
+                                                 randomBytes(1 << 20, 10) + QByteArray(3 << 20, 'z'));
+        QVERIFY(QFileInfo(unpacksLarge).size() < free);
+        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/fits.bin")), 0);
+        const QByteArray unpacked = treeDigest(flash());
+        QVector<ModuleInfo> modulesBefore, modulesAfter;
+        QCOMPARE(device->GetModules(modulesBefore, nullptr, nullptr), 0);
+        QCOMPARE(device->InstallPackage(large, 1), int(PortlexError::NoSpace));
+        QVERIFY2(device->statusText.contains(QLatin1String("bytes free")), qPrintable(device->statusText));
+        QCOMPARE(device->InstallPackage(unpacksLarge, 1), int(PortlexError::Refused));
+        QVERIFY2(device->statusText.contains(QLatin1String("more room")), qPrintable(device->statusText));
+        QCOMPARE(treeDigest(flash()), unpacked);
+        QCOMPARE(device->GetModules(modulesAfter, nullptr, nullptr), 0);
+        QCOMPARE(modulesAfter, modulesBefore);
+    }
+
+    void uploadCutByKillLeavesNothing()
+    {
+        // Slow answers keep the transfer going long enough to be cut in the middle.
+        const QSharedPointer<_ZantDevice> device = serve(LargeVolume, SlowAnswers);
+        QVERIFY(device);
+        QVERIFY(writeFile(local(QStringLiteral("big.bin")), randomBytes(64 * 1024 * 1024, 4)));
+        QVERIFY(cutByKill([&] { return device->CopyFileToDevice(local(QStringLiteral("big.bin")), QStringLiteral("/user/big.bin")); },
+                          [&] { return !leftovers(flash(QStringLiteral("user"))).isEmpty(); }));
+        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/big.bin"))));
+
+        // The restarted device clears what the crash left, and works again.
+        QVERIFY2(m_simulator->start(m_image->path(), DeviceId, {}, SimulatorProcess::Image::InPlace),
+                 qPrintable(m_simulator->errorString()));
+        QCOMPARE(leftovers(flash()), QStringList());
+        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/big.bin"))));
+        QCOMPARE(device->CopyFileToPC(QStringLiteral("/user/notes.txt"), local(QStringLiteral("n.txt"))), 0);
+    }
+
+    void downloadCutByKillLeavesNothing()
+    {
+        m_image->writeFile(QStringLiteral("flash/user/big.bin"), randomBytes(64 * 1024 * 1024, 5));
+        const QSharedPointer<_ZantDevice> device = serve(LargeVolume, SlowAnswers);
+        QVERIFY(device);
+        const QString target = local(QStringLiteral("target"));
+        QVERIFY(QDir().mkpath(target));
+        // The PC side's temporary file (unnamed where the system allows) shows that bytes are flowing.
+        QVERIFY(cutByKill([&] { return device->CopyFileToPC(QStringLiteral("/user/big.bin"), target + QStringLiteral("/big.bin")); },
+                          [&] { return writesInto(target); }));
+        QCOMPARE(treeEntries(target), QStringList());
+    }
+
+    void installShowsTheModule()
+    {
+        const QSharedPointer<_ZantDevice> device = serve();
+        QVERIFY(device);
+        QVERIFY(!device->cache.classes.value(QStringLiteral("0x01011002")).available);
+        const QString tuner = local(QStringLiteral("tuner"));
+        QString error;
+        QVERIFY2(SampleBuilder::writeModule(tuner, TestImage::module(QStringLiteral("tuner"), { 0x01011002 },
+                                                                     { { 0x01011002, 0x01011001, QStringLiteral("audio/x-tuner") } }), &error),
+                 qPrintable(error));
+        QCOMPARE(QProcess::execute(SimulatorProcess::executable(), { QStringLiteral("pack"), tuner, local(QStringLiteral("tuner.zantro")) }), 0);
+
+        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 1), 0);
+        QCOMPARE(device->statusText, QStringLiteral("Package tuner.zantro installed"));
+        QCOMPARE(readFile(flash(QStringLiteral("usermod/tuner/tuner.mif"))), readFile(tuner + QStringLiteral("/tuner.mif")));
+        QCOMPARE(leftovers(flash()), QStringList());
+
+        QVector<ModuleInfo> modules;
+        QVERIFY(device->GetModules(modules, nullptr, nullptr) == 0
+                && anyHas(modules, &ModuleInfo::path, QStringLiteral("/usermod/tuner/tuner.mif")));
+        QVector<RegistryInfo> registry;
+        QVERIFY(device->GetRegistry(registry, nullptr, nullptr) == 0
+                && anyHas(registry, &RegistryInfo::mimeType, QStringLiteral("audio/x-tuner")));
+        QVERIFY(Portlex::ConnectDevice(device, QString(), QString()));
+        QVERIFY(device->cache.classes.value(QStringLiteral("0x01011002")).available);
+
+        // Installing again replaces the module rather than failing or doubling it.
+        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 1), 0);
+        QCOMPARE(device->GetModules(modules, nullptr, nullptr), 0);
+        QCOMPARE(std::count_if(modules.cbegin(), modules.cend(), [](const ModuleInfo& m) { return m.name == QLatin1String("tuner"); }), 1);
+        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 9), int(PortlexError::NotFound));
+        QVERIFY(device->statusText.contains(QLatin1String("no volume 9")));
+    }
+
+    void runStartsAProcessThatEnds()
+    {
+        const QSharedPointer<_ZantDevice> device = serve(LargeVolume, { QStringLiteral("--run-lifetime"), QStringLiteral("300") });
+        QVERIFY(device);
+        const auto running = [&device] {
+            QVector<ProcessInfo> processes;
+            device->GetProcesses(processes);
+            return std::any_of(processes.cbegin(), processes.cend(),
+                               [](const ProcessInfo& p) { return p.name == QLatin1String("userm") && p.threads.size() == 3; });
+        };
+        QVERIFY(!running());
+        QCOMPARE(device->RunApplication(QStringLiteral("/usermod/userm/userm.mod")), 0);
+        QVERIFY(running());
+        QVector<LoadedModuleInfo> loaded;
+        QCOMPARE(device->GetLoadedModules(loaded), 0);
+        QVERIFY(std::any_of(loaded.cbegin(), loaded.cend(), [](const LoadedModuleInfo& p) {
+            return p.name == QLatin1String("userm")
+                && std::any_of(p.modules.cbegin(), p.modules.cend(),
+                               [](const LoadedModuleEntry& m) { return m.location == QLatin1String("/usermod/userm/userm.mod"); });
+        }));
+        QTRY_VERIFY_WITH_TIMEOUT(!running(), 15000);
+    }
+
+    void deleteFilesDirectoriesAndLinks()
+    {
+        const QSharedPointer<_ZantDevice> device = serve();
+        QVERIFY(device);
+        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/notes.txt")), 0);
+        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/notes.txt"))));
+        // The directory goes with its contents; the link inside it is removed, not followed.
+        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/docs")), 0);
+        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/docs"))));
+        // A link that points out of the volume: the link goes, its target stays.
+        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/outfile")), 0);
+        QVERIFY(!QFileInfo(flash(QStringLiteral("user/outfile"))).isSymLink());
+
+        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/notes.txt")), int(PortlexError::NotFound));
+        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/")), int(PortlexError::PathRefused));
+        QVERIFY(QFileInfo(flash(QStringLiteral("user"))).isDir());
+    }
+
+    // How each action uses the resolver: escapes through ".." and through links out, and
+    // run's refusals of what is no module. One device serves every row; nothing may change.
+    void refusals()
+    {
+        const QSharedPointer<_ZantDevice> device = serve();
+        QVERIFY(device);
+        QVERIFY(writeFile(local(QStringLiteral("payload.mod")), "overwritten"));
+        const QByteArray before = treeDigest(flash());
+        QVector<ProcessInfo> processesBefore;
+        QCOMPARE(device->GetProcesses(processesBefore), 0);
+
+        // > copies to the device, < to the PC, r runs, d deletes.
+        const struct { char action; const char* path; int code; } rows[] = {
+            { '>', "/../canary/secret.txt", PortlexError::PathRefused },
+            { '>', "/user/out/secret.txt", PortlexError::PathRefused },
+            { '>', "/user/outfile", PortlexError::PathRefused }, // a link to a file outside
+            { '<', "/user/../../canary/secret.txt", PortlexError::PathRefused },
+            { '<', "/user/docs/deep/escape/secret.txt", PortlexError::PathRefused },
+            { '<', "/user/outfile", PortlexError::PathRefused },
+            { 'r', "/../canary/inner/app.mod", PortlexError::PathRefused },
+            { 'r', "/user/out/inner/app.mod", PortlexError::PathRefused },
+            { 'd', "/user/../../canary/secret.txt", PortlexError::PathRefused },
+            { 'd', "/user/out/secret.txt", PortlexError::PathRefused },
+            { 'r', "/usermod/userm/none.mod", PortlexError::NotFound },
+            { 'r', "/usermod/userm/userm.mif", PortlexError::NotRunnable },
+            { 'r', "/user/notes.txt", PortlexError::NotRunnable },
+            { 'r', "/usermod/userm", PortlexError::NotRunnable },
+        };
+        for (const auto& [action, path, code] : rows) {
+            const QString where = QLatin1String(path);
+            const int result = action == '>' ? device->CopyFileToDevice(local(QStringLiteral("payload.mod")), where)
+                : action == '<'              ? device->CopyFileToPC(where, local(QStringLiteral("stolen")))
+                : action == 'r'              ? device->RunApplication(where)
+                                             : device->DeleteDeviceFile(where);
+            QVERIFY2(result == code && treeDigest(flash()) == before && !QFileInfo::exists(local(QStringLiteral("stolen"))),
+                     qPrintable(QStringLiteral("%1 %2: %3").arg(action).arg(where).arg(result)));
+        }
+        QVector<ProcessInfo> processesAfter;
+        QCOMPARE(device->GetProcesses(processesAfter), 0);
+        QCOMPARE(processesAfter.size(), processesBefore.size());
+        // The canary is compared in cleanup.
     }
 };
 

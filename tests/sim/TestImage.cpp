@@ -1,5 +1,6 @@
 #include "TestImage.h"
 
+#include <QCoreApplication>
 #include <QDir>
 #include <QtTest>
 
@@ -76,4 +77,16 @@ void TestImage::fillDefault()
     writeFile(QStringLiteral("flash/user/.hidden"), "h");
     writeFile(QStringLiteral("flash/shared/tone.mid"), QByteArray(9999, 't'));
     writeFile(QStringLiteral("card/user/photo.jpg"), QByteArray(200, 'p'));
+}
+
+bool TestImage::load()
+{
+    m_handler.reset();
+    m_state = std::make_unique<DeviceState>();
+    if (!m_state->load(path(), QCoreApplication::applicationDirPath())) {
+        qWarning("%s", qPrintable(m_state->errorString()));
+        return false;
+    }
+    m_handler = std::make_unique<SimRequestHandler>(*m_state);
+    return true;
 }

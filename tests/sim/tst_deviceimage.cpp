@@ -1,19 +1,22 @@
 #include "DeviceProfileParser.h"
-#include "DeviceState.h"
+#include "PackageWriter.h"
 #include "PortlexErrors.h"
-#include "SimRequestHandler.h"
 #include "TestImage.h"
+#include "TestSupport.h"
 
-#include <QCoreApplication>
 #include <QRegularExpression>
 #include <QtTest>
 
-static const QByteArray Volume = R"(<volume id="1" mount="/" folder="flash" size="10"/>)";
-static QByteArray device(const QByteArray& inside) { return "<device id=\"d\" name=\"n\">" + inside + "</device>"; }
-static QByteArray volume(const QByteArray& attributes) { return device("<volume id=\"1\" " + attributes + "/>"); }
+#include <functional>
+
+namespace {
+
+const QByteArray Volume = R"(<volume id="1" mount="/" folder="flash" size="10"/>)";
+QByteArray device(const QByteArray& inside) { return "<device id=\"d\" name=\"n\">" + inside + "</device>"; }
+QByteArray volume(const QByteArray& attributes) { return device("<volume id=\"1\" " + attributes + "/>"); }
 
 template <typename List, typename F>
-static QStringList texts(const List& list, F text)
+QStringList texts(const List& list, F text)
 {
     QStringList result;
     for (const auto& item : list)
@@ -21,94 +24,127 @@ static QStringList texts(const List& list, F text)
     return result;
 }
 
+QStringList files(const _DirectoryInfo& level)
+{
+    return texts(level.files, [](const auto& f) { return QStringLiteral("%1 %2 %3").arg(f->Path(), f->Attributes()).arg(f->size); });
+}
+
+// Request payloads as the gateway writes them.
+template <typename... Values>
+QByteArray pack(const Values&... values)
+{
+    QByteArray bytes;
+    PayloadStream out(&bytes);
+    ((out << values), ...);
+    return bytes;
+}
+
+// The first field of an answer: a status, a status text or a transfer id.
+template <typename T>
+T leading(const Answer& answer)
+{
+    PayloadStream in(answer.body);
+    T value {};
+    in >> value;
+    return value;
+}
+
+enum ConnectState { NeverSent, Refused, FailedByRule, RefusedLater };
+
+} // namespace
+
 // The device model built from an image (profile, modules, classes, registry, settings,
-// volumes, enablement) and the request handler's own rules.
+// volumes, enablement), the request handler's own rules, and the rules the device keeps for
+// itself: read-only system module folders, names kept for its own temporary files, Connect
+// before anything else, reservations that expire, rescans that read only what changed (and
+// no huge MIF) and keep-alives while unpacking.
 class TestDeviceImage : public QObject
 {
     Q_OBJECT
 
     std::unique_ptr<TestImage> m_image;
-    std::unique_ptr<DeviceState> m_state;
-    std::unique_ptr<SimRequestHandler> m_handler;
+    std::unique_ptr<QTemporaryDir> m_scratch;
 
-    // Loads the image (a fresh default one unless the test made its own) with a handler.
-    bool load(bool fresh = true)
+    DeviceState& state() { return m_image->state(); }
+    QString flash(const QString& relative) const { return m_image->path() + QStringLiteral("/flash/") + relative; }
+    Answer handle(Operation operation, const QByteArray& payload = {}, quint64 connection = 1, Protocol::RequestFlags flags = {})
     {
-        if (fresh) {
-            m_image = std::make_unique<TestImage>();
-            m_image->fillDefault();
-        }
-        m_handler.reset();
-        m_state = std::make_unique<DeviceState>();
-        if (!m_state->load(m_image->path(), QCoreApplication::applicationDirPath())) {
-            qWarning("%s", qPrintable(m_state->errorString()));
-            return false;
-        }
-        m_handler = std::make_unique<SimRequestHandler>(*m_state);
-        return true;
+        return m_image->handler().handle(Request {connection, operation, flags, payload, {}});
     }
-    Answer handle(Operation operation, const QByteArray& payload = {}, Protocol::RequestFlags flags = {}, quint64 connection = 1)
+    // Straight to the device's actions, as after an accepted Connect.
+    Answer act(Operation operation, const QByteArray& payload, quint64 connection = 1, const std::function<void()>& keepAlive = {})
     {
-        Request request;
-        request.connectionId = connection;
-        request.operation = operation;
-        request.payload = payload;
-        request.flags = flags;
-        return m_handler->handle(request);
+        return m_image->handler().actions().handle(Request {connection, operation, {}, payload, keepAlive});
     }
-    template <typename T>
-    static T decoded(const QByteArray& body)
+    Answer upload(const QString& path, const QByteArray& bytes)
     {
-        PayloadStream in(body);
-        T value {};
-        in >> value;
-        return value;
+        const Answer begun = act(Operation::CopyToDeviceBegin, pack(path, quint64(bytes.size())));
+        if (begun.result != 0)
+            return begun;
+        act(Operation::UploadChunk, pack(leading<quint32>(begun), bytes));
+        return act(Operation::CopyToDeviceCommit, pack(leading<quint32>(begun)));
     }
-    static QStringList files(const _DirectoryInfo& level)
+    QString writePackage(const std::function<void(PackageWriter&)>& fill)
     {
-        return texts(level.files,
-                     [](const auto& f) { return QStringLiteral("%1 %2 %3").arg(f->Path(), f->Attributes()).arg(f->size); });
+        const QString path = m_scratch->filePath(QStringLiteral("p%1.zantro").arg(QDir(m_scratch->path()).count()));
+        PackageWriter writer;
+        writer.open(path);
+        fill(writer);
+        return writer.close() ? path : QString();
+    }
+    Answer install(const QString& package, const std::function<void()>& keepAlive = {})
+    {
+        const QByteArray bytes = TestSupport::readFile(package);
+        const Answer begun = act(Operation::InstallPackageBegin, pack(quint16(1), QStringLiteral("p.zantro"), quint64(bytes.size())));
+        act(Operation::UploadChunk, pack(leading<quint32>(begun), bytes));
+        return act(Operation::InstallPackageCommit, pack(leading<quint32>(begun)), 1, keepAlive);
     }
 
 private slots:
-    void profileRefused_data()
+    void init()
     {
-        QTest::addColumn<QByteArray>("xml");
-        QTest::newRow("wrong root") << "<phone id=\"d\" name=\"n\">" + Volume + "</phone>";
-        QTest::newRow("id dot dot") << "<device id=\"..\" name=\"n\">" + Volume + "</device>";
-        QTest::newRow("no name") << "<device id=\"d\">" + Volume + "</device>";
-        QTest::newRow("bad connection") << "<device id=\"d\" name=\"n\" connection=\"wifi\">" + Volume + "</device>";
-        QTest::newRow("no volume") << device("");
-        QTest::newRow("volume without id") << device(R"(<volume mount="/" folder="f"/>)");
-        QTest::newRow("volume id twice") << device(Volume + R"(<volume id="1" mount="/c" folder="c"/>)");
-        QTest::newRow("mount twice") << device(Volume + R"(<volume id="2" mount="/" folder="c"/>)");
-        QTest::newRow("mount with dot dot") << volume(R"(mount="/a/../b" folder="f")");
-        QTest::newRow("folder dot dot") << volume(R"(mount="/" folder="..")");
-        QTest::newRow("module folder out") << volume(R"(mount="/" folder="f" modules="../x" install="../x")");
-        QTest::newRow("nested module folders") << volume(R"(mount="/" folder="f" modules="usermod/games usermod")");
-        QTest::newRow("install not a module folder") << volume(R"(mount="/" folder="f" modules="a" install="b")");
-        QTest::newRow("reserved above size") << volume(R"(mount="/" folder="f" size="10" reserved="11")");
-        QTest::newRow("flag not yes or no") << volume(R"(mount="/" folder="f" removable="true")");
-        QTest::newRow("settings name with slash") << device(Volume + R"(<settings><node name="a/b"/></settings>)");
-        QTest::newRow("settings name twice") << device(Volume + R"(<settings><node name="a"/><node name="a"/></settings>)");
-        const int deep = DeviceProfileParser::MaxSettingsDepth + 2;
-        QTest::newRow("settings too deep") << device(Volume + "<settings>" + QByteArray("<node name=\"n\">").repeated(deep)
-                                                     + QByteArray("</node>").repeated(deep) + "</settings>");
-        QTest::newRow("process without name") << device(Volume + R"(<processes><process/></processes>)");
-        QTest::newRow("interval too short") << device(Volume + R"(<processes interval="10"/>)");
-        QTest::newRow("transient without life") << device(Volume + R"(<processes><transient name="t" lifetime="0"/></processes>)");
-        QTest::newRow("bad enablement") << device(Volume + R"(<enablement mode="forever"/>)");
-        QTest::newRow("privilege without id") << device(Volume + R"(<enablement mode="service"><priviledge/></enablement>)");
-        QTest::newRow("platform class without id") << device(Volume + R"(<platform><class/></platform>)");
+        m_image = std::make_unique<TestImage>();
+        m_image->fillDefault();
+        m_scratch = std::make_unique<QTemporaryDir>();
+        QVERIFY(m_image->load());
     }
 
+    // Each rule the profile must keep, broken once.
     void profileRefused()
     {
-        QFETCH(QByteArray, xml);
-        DeviceProfileParser parser;
-        DeviceProfile profile;
-        QVERIFY(!parser.parse(xml, profile));
-        QVERIFY(!parser.errorString().isEmpty());
+        const int deep = DeviceProfileParser::MaxSettingsDepth + 2;
+        const QPair<const char*, QByteArray> profiles[] = {
+            {"wrong root", "<phone id=\"d\" name=\"n\">" + Volume + "</phone>"},
+            {"id dot dot", "<device id=\"..\" name=\"n\">" + Volume + "</device>"},
+            {"no name", "<device id=\"d\">" + Volume + "</device>"},
+            {"bad connection", "<device id=\"d\" name=\"n\" connection=\"wifi\">" + Volume + "</device>"},
+            {"no volume", device("")},
+            {"volume without id", device(R"(<volume mount="/" folder="f"/>)")},
+            {"volume id twice", device(Volume + R"(<volume id="1" mount="/c" folder="c"/>)")},
+            {"mount twice", device(Volume + R"(<volume id="2" mount="/" folder="c"/>)")},
+            {"mount with dot dot", volume(R"(mount="/a/../b" folder="f")")},
+            {"folder dot dot", volume(R"(mount="/" folder="..")")},
+            {"module folder out", volume(R"(mount="/" folder="f" modules="../x" install="../x")")},
+            {"nested module folders", volume(R"(mount="/" folder="f" modules="usermod/games usermod")")},
+            {"install not a module folder", volume(R"(mount="/" folder="f" modules="a" install="b")")},
+            {"reserved above size", volume(R"(mount="/" folder="f" size="10" reserved="11")")},
+            {"flag not yes or no", volume(R"(mount="/" folder="f" removable="true")")},
+            {"settings name with slash", device(Volume + R"(<settings><node name="a/b"/></settings>)")},
+            {"settings name twice", device(Volume + R"(<settings><node name="a"/><node name="a"/></settings>)")},
+            {"settings too deep", device(Volume + "<settings>" + QByteArray("<node name=\"n\">").repeated(deep)
+                                         + QByteArray("</node>").repeated(deep) + "</settings>")},
+            {"process without name", device(Volume + R"(<processes><process/></processes>)")},
+            {"interval too short", device(Volume + R"(<processes interval="10"/>)")},
+            {"transient without life", device(Volume + R"(<processes><transient name="t" lifetime="0"/></processes>)")},
+            {"bad enablement", device(Volume + R"(<enablement mode="forever"/>)")},
+            {"privilege without id", device(Volume + R"(<enablement mode="service"><priviledge/></enablement>)")},
+            {"platform class without id", device(Volume + R"(<platform><class/></platform>)")},
+        };
+        for (const auto& [what, xml] : profiles) {
+            DeviceProfileParser parser;
+            DeviceProfile profile;
+            QVERIFY2(!parser.parse(xml, profile) && !parser.errorString().isEmpty(), what);
+        }
     }
 
     void profileValues()
@@ -119,9 +155,6 @@ private slots:
         QCOMPARE(profile.displayName(), "Zantro Simulator - Test");
         QCOMPARE(profile.data.hardwareValue(QStringLiteral("Manufacturer"), QString()), "Test Maker");
         QCOMPARE(profile.data.video.value(QStringLiteral("H.263")), "No");
-        QCOMPARE(profile.volumes.at(0).moduleFolders, (QStringList {"sys/mod", "usermod"}));
-        QCOMPARE(profile.volumes.at(1).moduleFolders, QStringList {"usermod"});
-        QVERIFY(profile.volumes.at(1).removable);
         // Numbers are decimal or 0x-hexadecimal, never octal; ids are brought to one form.
         QVERIFY(parser.parse(device(R"(<volume id="010" mount="/" folder="f" size="0x20"/><platform><class id="0xabc"/></platform>)"),
                              profile));
@@ -135,17 +168,15 @@ private slots:
 
     void modulesFromMifs()
     {
-        m_image = std::make_unique<TestImage>();
-        m_image->fillDefault();
         const QString root = m_image->path();
         m_image->addModule("card/usermod/deep/er", TestImage::module("CardMod", {0x01014001}));
         QVERIFY(QFile::rename(root + "/card/usermod/deep/er/CardMod.mif", root + "/card/usermod/deep/er/CardMod.MIF"));
         m_image->writeFile("flash/usermod/broken/broken.mif", "not a mif at all");
         m_image->writeFile("flash/user/stray.mif", QByteArray()); // not in a module folder
         QVERIFY(QFile::link(root + "/flash/usermod/userm/userm.mif", root + "/flash/usermod/linked.mif"));
-        QVERIFY(load(false));
+        QVERIFY(m_image->load());
 
-        const QVector<ModuleInfo> modules = m_state->modules();
+        const QVector<ModuleInfo> modules = state().modules();
         QCOMPARE(texts(modules, [](const ModuleInfo& m) { return m.path + ' ' + m.version; }),
                  (QStringList {"/sys/mod/sysm/sysm.mif 1.2.3", "/usermod/broken/broken.mif ", "/usermod/userm/userm.mif 1.2.3",
                                "/card/usermod/deep/er/CardMod.MIF 1.2.3"}));
@@ -156,7 +187,7 @@ private slots:
 
         // By MIF path, by code path or by name; broken and linked MIFs are not served.
         MifEntry byPath;
-        QCOMPARE(m_state->moduleMif(QStringLiteral("/usermod/userm/userm.mif"), byPath), 0);
+        QCOMPARE(state().moduleMif(QStringLiteral("/usermod/userm/userm.mif"), byPath), 0);
         QCOMPARE(byPath.classes, (QVector<quint32> {0x01013001, 0x7F000001}));
         QCOMPARE(byPath.mimeTypes.size(), 2);
         QCOMPARE(byPath.filePath + ' ' + byPath.fileName, "/usermod/userm/userm.mif userm.mif");
@@ -165,15 +196,14 @@ private slots:
             {"nothing", PortlexError::NotFound}};
         for (const auto& [key, result] : lookups) {
             MifEntry entry;
-            QCOMPARE(m_state->moduleMif(QLatin1String(key), entry), result);
+            QCOMPARE(state().moduleMif(QLatin1String(key), entry), result);
             QVERIFY(result != 0 || entry == byPath);
         }
     }
 
     void classesAndRegistry()
     {
-        QVERIFY(load());
-        const DeviceCache cache = m_state->cache();
+        const DeviceCache cache = state().cache();
         QVERIFY(cache.filled);
         QCOMPARE((QStringList {cache.deviceName, cache.connectionKind, cache.deviceData.targetId}),
                  (QStringList {"Zantro Simulator - Test", "Simulator", "0x01020304"}));
@@ -190,75 +220,53 @@ private slots:
 
         // The system module claims text/plain first: active and restricted. The user module's
         // claim of the same type in other letter case is the second, inactive one.
-        const QVector<RegistryInfo> registry = m_state->registry();
+        const QVector<RegistryInfo> registry = state().registry();
         QCOMPARE(texts(registry, [](const RegistryInfo& r) {
                      return QStringLiteral("%1 %2>%3 %4%5%6").arg(r.mimeType).arg(r.handlerClassId, 0, 16).arg(r.baseClassId, 0, 16)
                          .arg(r.priority).arg(r.active ? " active" : "", r.restricted ? " restricted" : "");
                  }),
                  (QStringList {"text/plain 1012001>1011001 0 active restricted", "TEXT/plain 1013001>1011001 1",
                                "image/png 7f000001>1011001 0 active"}));
-        QCOMPARE(registry.at(0).moduleId, m_state->modules().at(0).moduleId);
-    }
-
-    void installedModuleChangesEverything()
-    {
-        QVERIFY(load());
-        const quint64 freeBefore = m_state->volumes().at(0).freeSpace;
-        m_image->addModule("flash/usermod/pager",
-                           TestImage::module("pager", {0x01011002}, {{0x01011002, 0x01011001, "application/x-page"}}));
-        QCOMPARE(m_state->modules().size(), 2); // nothing changes until the device is told
-        m_state->filesChanged();
-        QCOMPARE(m_state->modules().size(), 3);
-        QCOMPARE(m_state->cache().classes.value(QStringLiteral("0x01011002")).source, "/usermod/pager/pager.mif");
-        QCOMPARE(m_state->registry().at(1).mimeType, "application/x-page"); // "pager" sorts before "userm"
-        QVERIFY(m_state->volumes().at(0).freeSpace < freeBefore);
+        QCOMPARE(registry.at(0).moduleId, state().modules().at(0).moduleId);
     }
 
     void settingsTree()
     {
-        QVERIFY(load());
-        _SettingsInfo root(QString(), QStringLiteral("/"));
-        QCOMPARE(m_state->childSettings(QStringLiteral("/"), root), 0);
+        _SettingsInfo root(QString(), QStringLiteral("/")), appinfo(QString(), QStringLiteral("/appinfo"));
+        QCOMPARE(state().childSettings(QStringLiteral("/"), root), 0);
         QCOMPARE(root.values.size(), 1);
         QCOMPARE(texts(root.children, [](const auto& c) { return c->Path(); }), (QStringList {"/appinfo", "/CSA_REMOVAL"}));
-        _SettingsInfo appinfo(QString(), QStringLiteral("/appinfo"));
-        QCOMPARE(m_state->childSettings(QStringLiteral("/appinfo"), appinfo), 0);
+        QCOMPARE(state().childSettings(QStringLiteral("/appinfo"), appinfo), 0);
         QCOMPARE(appinfo.values, (QVector<QPair<QString, QString>> {{"count", "2"}, {"owner", "test"}}));
-        QCOMPARE(texts(appinfo.children, [](const auto& c) { return c->Path(); }),
-                 (QStringList {"/appinfo/calc", "/appinfo/notes"}));
-        _SettingsInfo calc;
-        QCOMPARE(m_state->childSettings(QStringLiteral("/appinfo/calc"), calc), 0);
-        QCOMPARE(calc.values.first().second, "1.0");
+        QCOMPARE(texts(appinfo.children, [](const auto& c) { return c->Path(); }), (QStringList {"/appinfo/calc", "/appinfo/notes"}));
         for (const char* missing : {"/appinfo/nothing", "appinfo"})
-            QCOMPARE(m_state->childSettings(QLatin1String(missing), calc), qint32(PortlexError::NotFound));
+            QCOMPARE(state().childSettings(QLatin1String(missing), appinfo), qint32(PortlexError::NotFound));
     }
 
     void volumesAndLevels()
     {
-        QVERIFY(load());
         qint64 used = 0;
         QDirIterator it(m_image->path() + "/flash", QDir::Files | QDir::Hidden, QDirIterator::Subdirectories);
         while (it.hasNext())
             used += QFileInfo(it.next()).size();
-        const QList<VolumeInfo> volumes = m_state->volumes();
+        const QList<VolumeInfo> volumes = state().volumes();
         QCOMPARE(volumes.at(0).freeSpace, quint64(1000000 - 1000 - used)); // less the reserve
         QCOMPARE(volumes.at(1).freeSpace, 300u); // 500 bytes, a 200-byte photo
-        QVERIFY(volumes.at(1).removable && volumes.at(1).mounted);
-        QCOMPARE(volumes.at(1).mountPoint + ' ' + QString::number(volumes.at(1).volumeId), "/card 2");
+        QVERIFY(volumes.at(1).removable && volumes.at(1).mounted && volumes.at(1).mountPoint == "/card" && volumes.at(1).volumeId == 2);
         m_image->writeFile("card/user/big.jpg", QByteArray(400, 'b'));
-        m_state->filesChanged();
-        QCOMPARE(m_state->volumes().at(1).freeSpace, 0u); // full, never negative
+        state().filesChanged();
+        QCOMPARE(state().volumes().at(1).freeSpace, 0u); // full, never negative
 
         _DirectoryInfo root, user, system, card;
-        QCOMPARE(m_state->fileSystemLevel(QStringLiteral("/"), root), 0);
+        QCOMPARE(state().fileSystemLevel(QStringLiteral("/"), root), 0);
         QCOMPARE(texts(root.directories, [](const auto& d) { return d->Path(); }),
                  (QStringList {"/shared", "/sys", "/user", "/usermod"}));
-        QCOMPARE(m_state->fileSystemLevel(QStringLiteral("/user/"), user), 0);
+        QCOMPARE(state().fileSystemLevel(QStringLiteral("/user/"), user), 0);
         QCOMPARE(user.Path(), "/user");
         QCOMPARE(files(user), (QStringList {"/user/.hidden rw-h 1", "/user/notes.txt rw- 5"}));
-        QCOMPARE(m_state->fileSystemLevel(QStringLiteral("/sys/mod/sysm"), system), 0);
+        QCOMPARE(state().fileSystemLevel(QStringLiteral("/sys/mod/sysm"), system), 0);
         QCOMPARE(files(system).last(), "/sys/mod/sysm/sysm.mod r-xs 100");
-        QCOMPARE(m_state->fileSystemLevel(QStringLiteral("/card"), card), 0);
+        QCOMPARE(state().fileSystemLevel(QStringLiteral("/card"), card), 0);
         QCOMPARE(card.Name() + ' ' + card.directories.first()->Path(), "/card /card/user");
 
         const struct { const char* path; qint32 result; } refusals[] = {
@@ -266,67 +274,205 @@ private slots:
             {"/user/..", PortlexError::PathRefused}, {"user", PortlexError::PathRefused}};
         for (const auto& refusal : refusals) {
             _DirectoryInfo level;
-            QCOMPARE(m_state->fileSystemLevel(QLatin1String(refusal.path), level), refusal.result);
+            QCOMPARE(state().fileSystemLevel(QLatin1String(refusal.path), level), refusal.result);
         }
     }
 
-    void enablementAndLocks()
+    void enablementAndRequests()
     {
-        QVERIFY(load());
         QString mode, owner, expiry;
-        QCOMPARE(m_state->tepStatus(mode, owner, expiry), EnablementEnabled);
-        QCOMPARE((QStringList {mode, owner, expiry}),
-                 (QStringList {"Developer Enabled Service", "Tester", "Sun Sep 19 20:00:00 2027"}));
-        QCOMPARE(m_state->globalTestSigStatus(mode, owner, expiry), EnablementDisabled);
-        QCOMPARE(texts(m_state->tepPriviledges(), [](const PriviledgeRecord& p) { return p.id + ' ' + p.name; }),
+        QCOMPARE(state().tepStatus(mode, owner, expiry), EnablementEnabled);
+        QCOMPARE((QStringList {mode, owner, expiry}), (QStringList {"Developer Enabled Service", "Tester", "Sun Sep 19 20:00:00 2027"}));
+        QCOMPARE(state().globalTestSigStatus(mode, owner, expiry), EnablementDisabled);
+        QCOMPARE(texts(state().tepPriviledges(), [](const PriviledgeRecord& p) { return p.id + ' ' + p.name; }),
                  (QStringList {"0x00000011 FileReadUser", "0x12345678 not found"}));
 
-        // A lock flag locks only its own mode, before the request that carries it is answered.
         QCOMPARE(handle(Operation::Connect).result, 0);
-        const auto status = [this](Protocol::RequestFlags flags) { return decoded<qint32>(handle(Operation::TepStatus, {}, flags).body); };
-        QCOMPARE(status(Protocol::SignatureLockRequest), qint32(EnablementEnabled));
-        QCOMPARE(status(Protocol::ServiceLockRequest), qint32(EnablementDisabled));
-        QVERIFY(m_state->tepPriviledges().isEmpty());
-    }
-
-    void malformedAndRefusedRequests()
-    {
-        QVERIFY(load());
-        QCOMPARE(handle(Operation::Connect).result, 0);
-        QByteArray escaping;
-        PayloadStream out(&escaping);
-        out << QStringLiteral("/../..");
         QCOMPARE(handle(Operation::GetChildSettings).result, qint32(PortlexError::BadRequest));
         QCOMPARE(handle(Operation::GetFileSystemLevel, QByteArray("\xff\xff\xff", 3)).result, qint32(PortlexError::BadRequest));
-        QCOMPARE(handle(Operation::GetFileSystemLevel, escaping).result, qint32(PortlexError::PathRefused));
+        QCOMPARE(handle(Operation::GetFileSystemLevel, pack(QStringLiteral("/../.."))).result, qint32(PortlexError::PathRefused));
         QCOMPARE(handle(Operation(9999)).result, qint32(PortlexError::UnknownOperation));
-
-        m_handler->refuseConnect(1106, QStringLiteral("Device busy"));
-        const Answer refused = handle(Operation::Connect, {}, {}, 2);
-        QCOMPARE(QString::number(refused.result) + ' ' + decoded<QString>(refused.body), "1106 Device busy");
-        QCOMPARE(handle(Operation::GetModules).result, 0); // only Connect is refused
+        // A lock flag locks only its own mode, before the request that carries it is answered.
+        const auto status = [this](Protocol::RequestFlags flags) { return leading<qint32>(handle(Operation::TepStatus, {}, 1, flags)); };
+        QCOMPARE(status(Protocol::SignatureLockRequest), qint32(EnablementEnabled));
+        QCOMPARE(status(Protocol::ServiceLockRequest), qint32(EnablementDisabled));
+        QVERIFY(state().tepPriviledges().isEmpty());
     }
 
-    // The committed samples load and hang together; their exact contents are theirs to change.
-    void sampleImages()
+    // System module folders are read-only and the names of the device's own temporary files
+    // are kept for it, while the install folder stays writable.
+    void writesTheDeviceRefuses()
     {
-        for (const char* name : {"simulator", "handset"}) {
-            DeviceState state;
-            const QString image = QStringLiteral(DELVIX_SAMPLES_DIR "/devices/") + name;
-            QVERIFY2(state.load(image, QCoreApplication::applicationDirPath()), qPrintable(state.errorString()));
-            QVERIFY(QRegularExpression(QStringLiteral("^[A-Z][a-z]{2} [A-Z][a-z]{2} [ 0-9]\\d \\d\\d:\\d\\d:\\d\\d \\d{4}$"))
-                        .match(state.profile().enablement.expires).hasMatch());
-            QVERIFY(!state.modules().isEmpty());
-            for (const ModuleInfo& module : state.modules()) {
-                MifEntry entry;
-                QCOMPARE(state.moduleMif(module.path, entry), 0);
-                QVERIFY2(!entry.classes.isEmpty(), qPrintable(module.path));
-            }
-            const DeviceCache cache = state.cache();
-            const auto available =
-                std::count_if(cache.classes.cbegin(), cache.classes.cend(), [](const IdRecord& r) { return r.available; });
-            QVERIFY(available > 0 && available < cache.classes.size()); // some classes are known but missing
+        QVERIFY(QFile::link(flash(QStringLiteral("sys/mod/sysm")), flash(QStringLiteral("user/syslink"))));
+        const int refused = PortlexError::PathRefused, refusedPackage = PortlexError::Refused;
+        // u uploads, d deletes, i installs a package whose one entry is the path.
+        const struct { char action; const char* path; int code; const char* because; } rows[] = {
+            {'u', "/sys/mod/sysm/sysm.mif", refused, "read-only"},
+            {'u', "/sys/mod/sysm/extra.txt", refused, "read-only"},
+            {'u', "/user/syslink/extra.txt", refused, "read-only"},
+            {'d', "/sys/mod/sysm", refused, "read-only"},
+            {'d', "/sys/mod/sysm/sysm.mod", refused, "read-only"},
+            {'d', "/sys", refused, "read-only"}, // it holds one
+            {'i', "sysm/SYSM.mif", refusedPackage, "would replace the system module"},
+            {'u', "/user/.zantro-partial-mine", refused, ".zantro-partial-"},
+            {'u', "/user/.zantro-staging-1", refused, ".zantro-staging-"},
+            {'i', ".zantro-staging-evil/m.mif", refusedPackage, "temporary files"},
+            {'i', "m/.zantro-partial-x", refusedPackage, "temporary files"},
+            {'u', "/usermod/userm/extra.txt", 0, ""},
+            {'d', "/usermod/userm", 0, ""},
+            {'i', "radio/radio.mif", 0, "installed"},
+        };
+        for (const auto& [action, path, code, because] : rows) {
+            const QByteArray before = TestSupport::treeDigest(m_image->path());
+            const QString where = QString::fromUtf8(path);
+            const Answer answer = action == 'u' ? upload(where, "new")
+                : action == 'd'                 ? act(Operation::DeleteDeviceFile, pack(where))
+                                                : install(writePackage([&](PackageWriter& w) { w.addFile(where, "x"); }));
+            const QString said = leading<QString>(answer);
+            QVERIFY2(answer.result == code && said.contains(QLatin1String(because)), qPrintable(where + ": " + said));
+            QVERIFY2((TestSupport::treeDigest(m_image->path()) == before) == (code != 0), path);
         }
+    }
+
+    void reservationExpiresWhenIdle_data()
+    {
+        QTest::addColumn<bool>("package");
+        QTest::newRow("upload") << false;
+        QTest::newRow("package") << true;
+    }
+
+    void reservationExpiresWhenIdle()
+    {
+        QFETCH(bool, package);
+        qint64 now = 0;
+        m_image->handler().actions().setClock([&now] { return now; });
+        const quint64 room = state().freeSpace(0);
+        const Answer hog = package ? act(Operation::InstallPackageBegin, pack(quint16(1), QStringLiteral("all.zantro"), room))
+                                   : act(Operation::CopyToDeviceBegin, pack(QStringLiteral("/user/all.bin"), room));
+        QCOMPARE(hog.result, 0);
+        const quint32 id = leading<quint32>(hog);
+        const auto other = [this] { return act(Operation::CopyToDeviceBegin, pack(QStringLiteral("/user/b.bin"), quint64(1)), 2).result; };
+        QCOMPARE(other(), int(PortlexError::NoSpace));
+
+        constexpr qint64 limit = DeviceActions::TransferIdleLimitMs;
+        now = limit - 1;
+        QCOMPARE(act(Operation::UploadChunk, pack(id, QByteArray("x"))).result, 0); // moving keeps it
+        now = 2 * limit - 1;
+        QCOMPARE(other(), int(PortlexError::NoSpace));
+        now = 2 * limit; // quiet for longer than the limit
+        QCOMPARE(other(), 0);
+        QCOMPARE(act(Operation::UploadChunk, pack(id, QByteArray("y"))).result, int(PortlexError::NotFound));
+        const QStringList partials = QStringList { TransferTable::PartialPrefix + QLatin1Char('*') };
+        QCOMPARE(QDir(flash(QStringLiteral("user"))).entryList(partials, QDir::Files | QDir::Hidden).size(), 1); // b.bin's
+        QCOMPARE(QDir(flash(QStringLiteral("usermod"))).entryList(partials, QDir::Files | QDir::Hidden).size(), 0);
+    }
+
+    void servesOnlyAfterConnect_data()
+    {
+        QTest::addColumn<int>("connect");
+        QTest::newRow("Connect never sent") << int(NeverSent);
+        QTest::newRow("Connect refused") << int(Refused);
+        QTest::newRow("Connect failed by a rule") << int(FailedByRule);
+        QTest::newRow("refused after an accepted Connect") << int(RefusedLater);
+    }
+
+    void servesOnlyAfterConnect()
+    {
+        QFETCH(int, connect);
+        const QByteArray hello = pack(QString(), QString());
+        QCOMPARE(handle(Operation::Connect, hello, 2).result, 0); // another client is connected
+        if (connect == RefusedLater)
+            QCOMPARE(handle(Operation::Connect, hello).result, 0);
+        if (connect == Refused || connect == RefusedLater)
+            m_image->handler().refuseConnect(77, QStringLiteral("Not now"));
+        if (connect == FailedByRule) {
+            FailurePlan plan;
+            QString error;
+            QVERIFY(plan.addRule(QStringLiteral("Connect=1106"), SimRequestHandler::operationNames(), &error));
+            m_image->handler().setFailurePlan(plan);
+        }
+        QVERIFY(connect == NeverSent || handle(Operation::Connect, hello).result != 0);
+
+        const qint32 notConnected = PortlexError::NotConnected;
+        QCOMPARE(handle(Operation::GetFileSystemLevel, pack(QStringLiteral("/user"))).result, notConnected);
+        QCOMPARE(handle(Operation::DeleteDeviceFile, pack(QStringLiteral("/user/notes.txt"))).result, notConnected);
+        QCOMPARE(handle(Operation::GetVolumes, {}, 1, Protocol::ServiceLockRequest).result, notConnected);
+        QVERIFY(QFileInfo::exists(flash(QStringLiteral("user/notes.txt"))));
+        QString mode, owner, expires;
+        QCOMPARE(state().tepStatus(mode, owner, expires), EnablementEnabled); // the lock request was not applied
+        QCOMPARE(handle(Operation::GetVolumes, {}, 2).result, 0); // a refusal is no one else's
+    }
+
+    // Told of changed files, the device reads again only the MIFs that changed, and none too large.
+    void catalogReadsOnlyWhatChanged()
+    {
+        const auto reads = [this] { return state().catalog().mifReads(); };
+        QCOMPARE(reads(), 2); // sysm and userm, once each
+        QCOMPARE(upload(QStringLiteral("/user/song.mp3"), "la").result, 0);
+        QCOMPARE(reads(), 2);
+
+        // A new module and a changed one: nothing changes until the device is told; then both
+        // count everywhere, the registry in module order.
+        const quint64 freeBefore = state().volumes().at(0).freeSpace;
+        m_image->addModule(QStringLiteral("flash/usermod/pager"), TestImage::module(QStringLiteral("pager"), {0x01011002},
+                           {{0x01011002, 0x01011001, QStringLiteral("application/x-page")}}));
+        const auto putUserModule = [this] {
+            m_image->addModule(QStringLiteral("flash/usermod/userm"), TestImage::module(QStringLiteral("userm"), {0x01013001}));
+        };
+        putUserModule();
+        QCOMPARE(state().modules().size(), 2);
+        state().filesChanged();
+        QCOMPARE(reads(), 4);
+        QCOMPARE(state().modules().size(), 3);
+        const DeviceCache cache = state().cache();
+        QCOMPARE(cache.classes.value(QStringLiteral("0x01011002")).source, "/usermod/pager/pager.mif");
+        QVERIFY(!cache.classes.contains(QStringLiteral("0x7F000001"))); // gone with the old userm.mif
+        QCOMPARE(texts(state().registry(), [](const RegistryInfo& r) { return r.mimeType; }), (QStringList {"text/plain", "application/x-page"}));
+        QVERIFY(state().volumes().at(0).freeSpace < freeBefore);
+        QCOMPARE(act(Operation::DeleteDeviceFile, pack(QStringLiteral("/usermod/userm"))).result, 0);
+        QCOMPARE(reads(), 4);
+        QCOMPARE(state().modules().size(), 2);
+        putUserModule();
+        state().filesChanged();
+        QCOMPARE(reads(), 5); // a module put back is read again
+
+        // A MIF above the limit is listed but never read; sparse files take no room.
+        QVERIFY(QDir().mkpath(flash(QStringLiteral("usermod/big"))));
+        QFile mif(flash(QStringLiteral("usermod/big/big.mif")));
+        QVERIFY(mif.open(QIODevice::WriteOnly) && mif.resize(ModuleCatalog::MaxMifSize));
+        state().filesChanged();
+        QCOMPARE(reads(), 6);
+        QVERIFY(mif.resize(ModuleCatalog::MaxMifSize + 1));
+        QTest::ignoreMessage(QtWarningMsg, QRegularExpression(QStringLiteral("Not reading .*big\\.mif")));
+        state().filesChanged();
+        QCOMPARE(reads(), 6);
+        MifEntry entry;
+        QCOMPARE(state().moduleMif(QStringLiteral("big"), entry), qint32(PortlexError::IoError));
+    }
+
+    void keepAliveWhileUnpacking_data()
+    {
+        QTest::addColumn<int>("files");
+        QTest::addColumn<int>("fileSize");
+        QTest::addColumn<int>("atLeast");
+        QTest::newRow("one 4 MiB file") << 1 << (4 << 20) << 16;
+        QTest::newRow("320 empty files") << 320 << 0 << 5;
+    }
+
+    void keepAliveWhileUnpacking()
+    {
+        QFETCH(int, files);
+        QFETCH(int, fileSize);
+        QFETCH(int, atLeast);
+        const QString package = writePackage([&](PackageWriter& w) {
+            for (int i = 0; i < files; ++i)
+                w.addFile(QStringLiteral("m/f%1").arg(i), TestSupport::randomBytes(fileSize, quint32(i)));
+        });
+        m_image->writeProfile(TestImage::defaultProfile().replace("size=\"1000000\"", "size=\"100000000\""));
+        QVERIFY(m_image->load());
+        int beats = 0; // the extractor's, through the keep-alive of the device's request
+        QCOMPARE(install(package, [&beats] { ++beats; }).result, 0);
+        QVERIFY2(beats >= atLeast, qPrintable(QString::number(beats)));
     }
 };
 

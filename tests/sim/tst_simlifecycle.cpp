@@ -1,5 +1,8 @@
 #include "DeviceConnection.h"
+#include "FailurePlan.h"
 #include "ImageCopy.h"
+#include "SimOptions.h"
+#include "SimRequestHandler.h"
 #include "TestSupport.h"
 
 #include <QCoreApplication>
@@ -10,94 +13,210 @@
 
 #include <csignal>
 
-// zantro-sim as a real process: clean ends on signals, --reset, start-up failures.
+using namespace TestSupport;
+
+// zantro-sim's command line, and the daemon as a real process: clean ends on signals, --reset
+// and its sweep of the copies that killed simulators left, start-up failures.
 class TestSimLifecycle : public QObject
 {
     Q_OBJECT
 
+    QTemporaryDir m_imageDir; // the copied sample, which no test may change
     std::unique_ptr<QTemporaryDir> m_dir;
     QString m_image;
-    QString m_sockets;
+    QByteArray m_imageDigest;
 
     static QString executable() { return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim"); }
-    // Starts zantro-sim on the copied sample and reads its "serving IMAGE on SOCKET" line.
-    bool start(QProcess& process, const QStringList& extra, QString& servedImage, QString& socketPath)
+
+    // Serves the copied sample with a client connected, ends it with signalNumber and checks
+    // that it went cleanly; the greeting is "display name|device id" as the gateway sees it.
+    void serveAndEnd(QProcess& process, const QStringList& extra, int signalNumber, const QString& greeting, QString& served)
     {
-        process.start(executable(), QStringList {"--image", m_image, "--socket-dir", m_sockets} + extra);
+        const QString sockets = m_dir->filePath(QStringLiteral("run/sockets"));
+        process.start(executable(), QStringList {"--image", m_image, "--socket-dir", sockets} + extra);
         QByteArray output;
         while (!output.contains('\n') && process.waitForReadyRead(10000))
             output += process.readAllStandardOutput();
         const QString line = QString::fromLocal8Bit(output).trimmed();
         const qsizetype on = line.lastIndexOf(QLatin1String(" on "));
-        if (!line.startsWith(QLatin1String("zantro-sim: serving ")) || on < 0) {
-            qWarning() << "zantro-sim did not start:" << line << process.readAllStandardError();
-            return false;
-        }
-        servedImage = line.mid(20, on - 20);
-        socketPath = line.mid(on + 4);
-        return true;
-    }
-    // "display name|device id" from a handshake, as the gateway sees it.
-    static QString greeting(const QString& socketPath)
-    {
-        DeviceConnection connection(socketPath);
-        if (!connection.startHandshake() || connection.finishHandshake(QDeadlineTimer(5000)) != 0)
-            return connection.errorString();
-        return connection.displayName() + '|' + connection.deviceId();
-    }
+        QVERIFY2(line.startsWith(QLatin1String("zantro-sim: serving ")) && on > 0, qPrintable(line));
+        served = line.mid(20, on - 20);
+        const QString socket = line.mid(on + 4);
+        QCOMPARE(QFileInfo(socket).absolutePath(), sockets);
+        QCOMPARE(treeDigest(served), m_imageDigest); // all of the image is served
+        // A copy carries its owner's pid, by which a later --reset tells an orphan.
+        const QString owned = QStringLiteral("zantro-sim-image-%1-").arg(process.processId());
+        QVERIFY(served == m_image || QFileInfo(served).fileName().startsWith(owned));
+        DeviceConnection connection(socket);
+        QVERIFY(connection.startHandshake() && connection.finishHandshake(QDeadlineTimer(5000)) == 0);
+        QCOMPARE(connection.displayName() + '|' + connection.deviceId(), greeting);
 
-private slots:
-    void init()
-    {
-        m_dir = std::make_unique<QTemporaryDir>();
-        m_image = m_dir->filePath(QStringLiteral("image"));
-        m_sockets = m_dir->filePath(QStringLiteral("run/sockets"));
-        QString error;
-        QVERIFY2(ImageCopy::copyTree(QStringLiteral(DELVIX_SAMPLES_DIR "/devices/simulator"), m_image, &error), qPrintable(error));
-    }
-
-    void signalEndsCleanly_data()
-    {
-        QTest::addColumn<int>("signalNumber");
-        QTest::newRow("SIGTERM") << int(SIGTERM);
-        QTest::newRow("SIGINT") << int(SIGINT);
-    }
-
-    void signalEndsCleanly()
-    {
-        QFETCH(int, signalNumber);
-        QProcess process;
-        QString served, socket;
-        QVERIFY(start(process, {"--id", "life-1"}, served, socket));
-        QCOMPARE(served, m_image);
-        QCOMPARE(QFileInfo(socket).absolutePath(), m_sockets);
-        QCOMPARE(greeting(socket), "Zantro Simulator - Aurora|life-1");
         QLocalSocket idle; // a connected client must not keep the daemon alive
         idle.connectToServer(socket);
         QVERIFY(idle.waitForConnected(2000));
-
         QCOMPARE(::kill(pid_t(process.processId()), signalNumber), 0);
         QVERIFY(process.waitForFinished(5000));
         QCOMPARE(process.exitStatus(), QProcess::NormalExit);
         QCOMPARE(process.exitCode(), 0);
         QVERIFY(!QFileInfo::exists(socket) && !QFileInfo(socket).isSymLink());
+        QCOMPARE(treeDigest(m_image), m_imageDigest);
     }
 
-    void resetLeavesTheImageUntouched()
+private slots:
+    void initTestCase()
     {
-        const QByteArray before = TestSupport::treeDigest(m_image);
-        QProcess process;
-        QString served, socket;
-        QVERIFY(start(process, {"--reset"}, served, socket));
-        QVERIFY(served != m_image);
-        QCOMPARE(TestSupport::treeDigest(served), before); // a full copy is served
-        QVERIFY(greeting(socket).endsWith("|aurora-sim")); // the image's own id
+        m_image = m_imageDir.filePath(QStringLiteral("image"));
+        QString error;
+        QVERIFY2(ImageCopy::copyTree(QStringLiteral(DELVIX_SAMPLES_DIR "/devices/simulator"), m_image, &error), qPrintable(error));
+        m_imageDigest = treeDigest(m_image);
+    }
 
-        QCOMPARE(::kill(pid_t(process.processId()), SIGTERM), 0);
-        QVERIFY(process.waitForFinished(5000));
-        QCOMPARE(process.exitCode(), 0);
+    void init() { m_dir = std::make_unique<QTemporaryDir>(); }
+
+    void failRules_data()
+    {
+        QTest::addColumn<QString>("rule");
+        QTest::addColumn<QString>("operation"); // empty: the rule is refused
+        QTest::addColumn<QString>("path");
+        QTest::addColumn<qint32>("code");
+        QTest::newRow("whole operation") << "GetRegistry=3" << "GetRegistry" << "" << 3;
+        QTest::newRow("path") << "GetChildSettings:/appinfo=0xdeadbeef" << "GetChildSettings" << "/appinfo" << qint32(0xDEADBEEF);
+        QTest::newRow("path with = and :") << "GetFileSystemLevel:/a=b:c=7" << "GetFileSystemLevel" << "/a=b:c" << 7;
+        QTest::newRow("largest code") << "GetModules=4294967295" << "GetModules" << "" << qint32(-1);
+        for (const char* refused : {"GetRegistry=0", "GetRegistry=0x100000000", "GetWeather=3", "getregistry=3", "Hello=3",
+                                    "GetChildSettings:=3"})
+            QTest::newRow(refused) << refused << "" << "" << 0;
+    }
+
+    void failRules()
+    {
+        QFETCH(QString, rule);
+        QFETCH(QString, operation);
+        QFETCH(QString, path);
+        QFETCH(qint32, code);
+        FailurePlan plan;
+        QString error;
+        QCOMPARE(plan.addRule(rule, SimRequestHandler::operationNames(), &error), !operation.isEmpty());
+        QCOMPARE(error.isEmpty() && !plan.isEmpty(), !operation.isEmpty());
+        if (operation.isEmpty())
+            return;
+        qint32 matched = 0;
+        QVERIFY(plan.match(operation, path, matched));
+        QCOMPARE(matched, code);
+        QVERIFY(path.isEmpty() || !plan.match(operation, path + QStringLiteral("/x"), matched));
+    }
+
+    void failPrecedence()
+    {
+        FailurePlan plan;
+        QString error;
+        for (const char* rule : {"GetFileSystemLevel=5", "GetFileSystemLevel:/user=0xDEADBEEF", "GetFileSystemLevel=6"})
+            QVERIFY(plan.addRule(QLatin1String(rule), SimRequestHandler::operationNames(), &error));
+        qint32 code = 0;
+        QVERIFY(plan.match(QStringLiteral("GetFileSystemLevel"), QStringLiteral("/user"), code));
+        QCOMPARE(code, qint32(0xDEADBEEF)); // the rule for the path wins, whatever the order
+        QVERIFY(plan.match(QStringLiteral("GetFileSystemLevel"), QStringLiteral("/shared"), code));
+        QCOMPARE(code, 5); // the first rule for the whole operation
+        QVERIFY(!plan.match(QStringLiteral("GetModules"), QString(), code));
+    }
+
+    void accepted()
+    {
+        SimOptions options;
+        QVERIFY2(options.parse({"zantro-sim", "--image", "/img", "--id", "dev-1.a_b", "--socket-dir", "/s", "--reset",
+                                "--refuse-connect", "0x10:Busy: try later", "--latency", "250", "--fail", "GetRegistry=3",
+                                "--fail", "GetModules=4"}),
+                 qPrintable(options.errorString()));
+        QCOMPARE(options.command, SimOptions::Command::Serve);
+        QCOMPARE((QStringList {options.imageDir, options.deviceId, options.socketDir, options.refuseText}),
+                 (QStringList {"/img", "dev-1.a_b", "/s", "Busy: try later"}));
+        QVERIFY(options.reset);
+        QCOMPARE((QList<int> {options.refuseCode, options.latencyMs}), (QList<int> {16, 250}));
+        qint32 code = 0;
+        QVERIFY(options.failures.match(QStringLiteral("GetRegistry"), QString(), code) && code == 3);
+        QVERIFY(options.failures.match(QStringLiteral("GetModules"), QString(), code) && code == 4);
+
+        SimOptions defaults;
+        QVERIFY(defaults.parse({"zantro-sim", "--image=/img"}));
+        QCOMPARE(defaults.imageDir, "/img");
+        QVERIFY(!defaults.reset && defaults.refuseCode == 0 && defaults.deviceId.isEmpty() && defaults.failures.isEmpty());
+
+        SimOptions generate;
+        QVERIFY(generate.parse({"zantro-sim", "generate", "out", "--modules", "10000", "--classes", "20", "--files", "0",
+                                "--processes", "3"}));
+        const ImageGenerator::Counts& counts = generate.counts;
+        QCOMPARE((QList<int> {counts.modules, counts.classes, counts.files, counts.processes}), (QList<int> {10000, 20, 0, 3}));
+        QVERIFY(generate.command == SimOptions::Command::Generate && generate.outputDir == "out");
+        SimOptions sample;
+        QVERIFY(sample.parse({"zantro-sim", "make-sample", "d.xml", "img"}));
+        QVERIFY(sample.command == SimOptions::Command::MakeSample);
+        QCOMPARE(sample.descriptionPath + ' ' + sample.outputDir, "d.xml img");
+    }
+
+    void refused()
+    {
+        const QStringList refused[] = {
+            {}, // no image
+            {"--image", "/i", "--turbo"},
+            {"--image", "/i", "--id", "../x"},
+            {"--image", "/i", "--latency", "-1"},
+            {"--image", "/i", "--refuse-connect", "5"}, // no text
+            {"--image", "/i", "--refuse-connect", "0:ok"},
+            {"--image", "/i", "--fail", "GetRegistry"},
+            {"generate", "--modules", "5"}, // no folder
+            {"generate", "out", "--files", "-5"},
+            {"make-sample", "desc.xml"},
+        };
+        for (const QStringList& arguments : refused) {
+            SimOptions options;
+            QVERIFY2(!options.parse(QStringList {"zantro-sim"} + arguments) && !options.errorString().isEmpty(),
+                     qPrintable(arguments.join(' ')));
+        }
+    }
+
+    void inPlaceEndsOnSigint()
+    {
+        QProcess process;
+        QString served;
+        serveAndEnd(process, {"--id", "life-1"}, SIGINT, "Zantro Simulator - Aurora|life-1", served);
+        QVERIFY(!QTest::currentTestFailed());
+        QCOMPARE(served, m_image);
+    }
+
+    void resetServesACopyAndSweepsOrphans()
+    {
+        // In the temporary folder: a copy whose simulator was killed, with a link out that the
+        // sweep must not follow, and what only looks like one.
+        const QString temp = m_dir->filePath(QStringLiteral("tmp")), canary = m_dir->filePath(QStringLiteral("canary"));
+        QVERIFY(writeFile(canary + QStringLiteral("/keep.txt"), "canary"));
+        QProcess ended;
+        ended.start(QStringLiteral("true"), QStringList());
+        QVERIFY(ended.waitForStarted());
+        const qint64 dead = ended.processId();
+        QVERIFY(ended.waitForFinished());
+        const QString copy = temp + QStringLiteral("/zantro-sim-image-%1-%2");
+        const QString orphan = copy.arg(dead).arg(QStringLiteral("abc123"));
+        QVERIFY(writeFile(orphan + QStringLiteral("/device.xml"), "x"));
+        QVERIFY(QFile::link(canary, orphan + QStringLiteral("/outside")));
+        const QStringList kept { copy.arg(QCoreApplication::applicationPid()).arg(QStringLiteral("def456")), // its owner runs
+                                 copy.arg(dead).arg(QStringLiteral("lnk789")), copy.arg(dead).arg(QStringLiteral("fil000")),
+                                 temp + QStringLiteral("/zantro-sim-image-Ab12Cd") };
+        QVERIFY(QDir().mkpath(kept.at(0)) && QDir().mkpath(kept.at(3)));
+        QVERIFY(QFile::link(canary, kept.at(1)) && writeFile(kept.at(2), "f"));
+
+        QProcess process;
+        QProcessEnvironment environment = QProcessEnvironment::systemEnvironment();
+        environment.insert(QStringLiteral("TMPDIR"), temp);
+        process.setProcessEnvironment(environment);
+        QString served;
+        serveAndEnd(process, {"--reset"}, SIGTERM, "Zantro Simulator - Aurora|aurora-sim", served); // the image's own id
+        QVERIFY(!QTest::currentTestFailed());
+        QCOMPARE(QFileInfo(served).absolutePath(), temp);
         QVERIFY(!QFileInfo::exists(served)); // the copy goes with the daemon
-        QCOMPARE(TestSupport::treeDigest(m_image), before);
+        QVERIFY(!QFileInfo::exists(orphan));
+        for (const QString& path : kept)
+            QVERIFY2(QFileInfo(path).exists(), qPrintable(path));
+        QCOMPARE(readFile(canary + QStringLiteral("/keep.txt")), QByteArray("canary"));
     }
 
     void startFailures_data()
