@@ -9,13 +9,6 @@
 
 #include <signal.h>
 
-namespace {
-
-constexpr int StartTimeoutMs = 20000;
-constexpr int ProbeTimeoutMs = 200;
-
-} // namespace
-
 SimulatorProcess::SimulatorProcess(const QString& socketDirectory)
     : m_socketDirectory(socketDirectory)
 {
@@ -24,51 +17,36 @@ SimulatorProcess::SimulatorProcess(const QString& socketDirectory)
 
 SimulatorProcess::~SimulatorProcess()
 {
-    if (isRunning()) {
-        resume();
-        stop();
-    }
+    resume();
+    stop();
 }
 
-QString SimulatorProcess::executable()
-{
-    return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim");
-}
+QString SimulatorProcess::executable() { return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim"); }
 
-QString SimulatorProcess::sampleImage(const QString& name)
-{
-    return QStringLiteral(DELVIX_SAMPLES_DIR "/devices/") + name;
-}
+QString SimulatorProcess::sampleImage(const QString& name) { return QStringLiteral(DELVIX_SAMPLES_DIR "/devices/") + name; }
 
 bool SimulatorProcess::start(const QString& image, const QString& id, const QStringList& extraArguments, Image use)
 {
     m_error.clear();
     m_socketPath.clear();
-    QStringList arguments { QStringLiteral("--image"), image, QStringLiteral("--id"), id, QStringLiteral("--socket-dir"),
-                            m_socketDirectory };
-    if (use == Image::FreshCopy)
-        arguments << QStringLiteral("--reset");
-    arguments += extraArguments;
     removeServedCopy();
-    m_process.start(executable(), arguments);
+    const QStringList reset = use == Image::FreshCopy ? QStringList {QStringLiteral("--reset")} : QStringList();
+    m_process.start(executable(), QStringList {"--image", image, "--id", id, "--socket-dir", m_socketDirectory} + reset + extraArguments);
     if (!m_process.waitForStarted()) {
         m_error = m_process.errorString();
         return false;
     }
-    const QDeadlineTimer deadline(StartTimeoutMs);
-    while (!deadline.hasExpired()) {
+    for (const QDeadlineTimer deadline(20000); !deadline.hasExpired();) {
         m_socketPath = findSocket(id);
         if (!m_socketPath.isEmpty()) {
-            if (use == Image::FreshCopy) {
-                // "zantro-sim: serving COPY on SOCKET": the copy to remove should the process be killed.
-                QByteArray said = m_process.readAll();
-                while (!said.contains('\n') && m_process.waitForReadyRead(1000))
-                    said += m_process.readAll();
-                const QString line = QString::fromLocal8Bit(said);
-                const int from = line.indexOf(QLatin1String("serving ")), to = line.indexOf(QLatin1String(" on "));
-                if (from >= 0 && to > from)
-                    m_servedCopy = line.mid(from + 8, to - from - 8);
-            }
+            // "zantro-sim: serving COPY on SOCKET": the copy to remove should the process be killed.
+            QByteArray said = m_process.readAll();
+            while (use == Image::FreshCopy && !said.contains('\n') && m_process.waitForReadyRead(1000))
+                said += m_process.readAll();
+            const QString line = QString::fromLocal8Bit(said);
+            const int from = line.indexOf(QLatin1String("serving ")), to = line.indexOf(QLatin1String(" on "));
+            if (use == Image::FreshCopy && from >= 0 && to > from)
+                m_servedCopy = line.mid(from + 8, to - from - 8);
             return true;
         }
         // Doubles as the pause between probes and notices an early exit.
@@ -85,10 +63,9 @@ bool SimulatorProcess::start(const QString& image, const QString& id, const QStr
 QString SimulatorProcess::findSocket(const QString& id) const
 {
     const QDir folder(m_socketDirectory);
-    const QStringList names = folder.entryList(QDir::System | QDir::Files | QDir::Hidden | QDir::NoDotAndDotDot);
-    for (const QString& name : names) {
+    for (const QString& name : folder.entryList(QDir::System | QDir::Files | QDir::Hidden | QDir::NoDotAndDotDot)) {
         DeviceConnection probe(folder.filePath(name));
-        if (probe.startHandshake() && probe.finishHandshake(QDeadlineTimer(ProbeTimeoutMs)) == 0 && probe.deviceId() == id)
+        if (probe.startHandshake() && probe.finishHandshake(QDeadlineTimer(200)) == 0 && probe.deviceId() == id)
             return probe.socketPath();
     }
     return QString();
@@ -115,10 +92,8 @@ bool SimulatorProcess::stop()
     if (!isRunning())
         return true;
     sendSignal(SIGTERM);
-    bool clean = false;
-    if (m_process.waitForFinished(10000)) {
-        clean = m_process.exitStatus() == QProcess::NormalExit;
-    } else {
+    const bool clean = m_process.waitForFinished(10000) && m_process.exitStatus() == QProcess::NormalExit;
+    if (isRunning()) {
         m_process.kill();
         m_process.waitForFinished();
     }
@@ -136,21 +111,16 @@ void SimulatorProcess::kill()
 // A clean exit removes the copy itself; a killed simulator leaves it behind.
 void SimulatorProcess::removeServedCopy()
 {
-    if (!m_servedCopy.isEmpty() && !isRunning())
+    if (isRunning())
+        return;
+    if (!m_servedCopy.isEmpty())
         QDir(m_servedCopy).removeRecursively();
-    if (!isRunning())
-        m_servedCopy.clear();
+    m_servedCopy.clear();
 }
 
-void SimulatorProcess::pause()
-{
-    sendSignal(SIGSTOP);
-}
+void SimulatorProcess::pause() { sendSignal(SIGSTOP); }
 
-void SimulatorProcess::resume()
-{
-    sendSignal(SIGCONT);
-}
+void SimulatorProcess::resume() { sendSignal(SIGCONT); }
 
 void SimulatorProcess::sendSignal(int number)
 {

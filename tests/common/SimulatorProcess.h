@@ -17,15 +17,13 @@ public:
     SimulatorProcess(const SimulatorProcess&) = delete;
     SimulatorProcess& operator=(const SimulatorProcess&) = delete;
 
-    // zantro-sim beside the running test executable.
-    static QString executable();
-    // samples/devices/<name> of the source tree.
-    static QString sampleImage(const QString& name);
+    static QString executable();                   // zantro-sim beside the test executable
+    static QString sampleImage(const QString& name); // samples/devices/<name> of the source tree
 
     enum class Image
     {
-        FreshCopy,  // --reset: the image stays as it is
-        InPlace,    // for large generated images that nobody else uses
+        FreshCopy, // --reset: the image stays as it is
+        InPlace,   // for large generated images that nobody else uses
     };
 
     // Starts serving image as device id and waits until the device answers a handshake.
@@ -36,26 +34,20 @@ public:
     QSharedPointer<_ZantDevice> connectDevice(const QString& image, const QString& id,
                                               const QStringList& extraArguments = QStringList(),
                                               Image use = Image::FreshCopy);
-    // SIGTERM, then waits for the process to end.
-    bool stop();
-    // SIGKILL: the socket file stays behind, as after a crash.
-    void kill();
-    void pause();   // SIGSTOP
-    void resume();  // SIGCONT
+    bool stop();   // SIGTERM, then waits for the process to end
+    void kill();   // SIGKILL: the socket file stays behind, as after a crash
+    void pause();  // SIGSTOP
+    void resume(); // SIGCONT
 
     bool isRunning() const { return m_process.state() != QProcess::NotRunning; }
     QString socketPath() const { return m_socketPath; }
-    // Why start failed, with what the simulator printed.
-    QString errorString() const { return m_error; }
+    QString errorString() const { return m_error; } // why start failed, with what the simulator printed
 
 private:
     QString findSocket(const QString& id) const;
     void sendSignal(int number);
     void removeServedCopy();
 
-    QString m_socketDirectory;
-    QString m_socketPath;
-    QString m_error;
-    QString m_servedCopy;
+    QString m_socketDirectory, m_socketPath, m_error, m_servedCopy;
     QProcess m_process;
 };

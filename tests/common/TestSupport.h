@@ -55,16 +55,13 @@ inline QByteArray treeDigest(const QString& root)
 {
     QCryptographicHash hash(QCryptographicHash::Sha256);
     for (const QString& relative : treeEntries(root)) {
-        const QString path = QDir(root).filePath(relative);
-        const QFileInfo info(path);
+        const QFileInfo info(QDir(root).filePath(relative));
+        QFile file(info.filePath());
         hash.addData(relative.toUtf8());
-        if (info.isSymLink()) {
+        if (info.isSymLink())
             hash.addData(info.symLinkTarget().toUtf8());
-        } else if (info.isFile()) {
-            QFile file(path);
-            if (file.open(QIODevice::ReadOnly))
-                hash.addData(&file);
-        }
+        else if (info.isFile() && file.open(QIODevice::ReadOnly))
+            hash.addData(&file);
     }
     return hash.result();
 }
@@ -99,8 +96,7 @@ inline bool makeStaleSocket(const QString& path)
     const int fd = ::socket(AF_UNIX, SOCK_STREAM, 0);
     sockaddr_un address {};
     address.sun_family = AF_UNIX;
-    const QByteArray name = QFile::encodeName(path);
-    qstrncpy(address.sun_path, name.constData(), sizeof(address.sun_path));
+    qstrncpy(address.sun_path, QFile::encodeName(path).constData(), sizeof(address.sun_path));
     const bool bound = ::bind(fd, reinterpret_cast<sockaddr*>(&address), sizeof(address)) == 0;
     ::close(fd);
     return bound;

@@ -125,21 +125,16 @@ private slots:
     void moduleFiles()
     {
         QTemporaryDir dir;
-        const QString path = dir.filePath("module.mif");
         QString error;
-        QVERIFY2(MifWriter::writeModuleFile(path, richEntry(), &error), qPrintable(error));
+        QVERIFY2(MifWriter::writeModuleFile(dir.filePath("module.mif"), richEntry(), &error), qPrintable(error));
         MifReader reader;
-        QVERIFY2(reader.readFile(path), qPrintable(reader.errorString()));
         MifEntry decoded;
-        QVERIFY(reader.decodeModule(decoded));
+        QVERIFY(reader.readFile(dir.filePath("module.mif")) && reader.decodeModule(decoded));
         QCOMPARE(decoded.header.size(), ModuleHeaderSize);
         decoded.header.clear();
         QVERIFY(decoded == richEntry());
-
-        QVERIFY(!reader.readFile(dir.filePath("missing.mif")));
-        QVERIFY(reader.errorString().contains("missing.mif"));
-        QVERIFY(!MifWriter::writeModuleFile(dir.filePath("no/such/folder/module.mif"), richEntry(), &error));
-        QVERIFY(!error.isEmpty());
+        QVERIFY(!reader.readFile(dir.filePath("missing.mif")) && reader.errorString().contains("missing.mif"));
+        QVERIFY(!MifWriter::writeModuleFile(dir.filePath("no/such/folder/module.mif"), richEntry(), &error) && !error.isEmpty());
     }
 
     void containerLookups()
@@ -169,63 +164,44 @@ private slots:
         MifEntry entry = richEntry();
         QVERIFY(!reader.decodeModule(entry));
         QVERIFY(entry == MifEntry());
-    }
 
-    // Of two entries covering an id, the first in the table wins.
-    void firstEntryWins()
-    {
+        // Of two entries covering an id, the first in the table wins.
         for (bool wideFirst : {true, false}) {
-            MifWriter writer;
+            MifWriter overlapping;
             for (const char* blob : {"w0", "w1", "w2", "narrow"})
-                writer.addBlob(blob);
-            writer.addEntry(1, wideFirst ? 10 : 11, wideFirst ? 2 : 0, wideFirst ? 0 : 3);
-            writer.addEntry(1, wideFirst ? 11 : 10, wideFirst ? 0 : 2, wideFirst ? 3 : 0);
-            MifReader reader;
-            QVERIFY(reader.readData(writer.data()));
-            QCOMPARE(reader.resource(1, 10), QByteArray("w0"));
-            QCOMPARE(reader.resource(1, 11), QByteArray(wideFirst ? "w1" : "narrow"));
-            QCOMPARE(reader.resource(1, 12), QByteArray("w2"));
+                overlapping.addBlob(blob);
+            overlapping.addEntry(1, wideFirst ? 10 : 11, wideFirst ? 2 : 0, wideFirst ? 0 : 3);
+            overlapping.addEntry(1, wideFirst ? 11 : 10, wideFirst ? 0 : 2, wideFirst ? 3 : 0);
+            QVERIFY(reader.readData(overlapping.data()));
+            QCOMPARE(reader.resource(1, 10) + reader.resource(1, 11) + reader.resource(1, 12),
+                     QByteArray(wideFirst ? "w0w1w2" : "w0narroww2"));
         }
-    }
 
-    void offsetBaseIsIrrelevant()
-    {
-        // Another writer may count offsets from the blob area rather than from the file start.
+        // Another writer may count offsets from the blob area rather than from the file start;
+        // bytes after the last blob are ignored.
         QByteArray data = twoBlobFile();
         const int table = FileHeaderSize + 2 * EntrySize;
         const quint32 base = get32(data, table);
         for (int k = 0; k < 3; ++k)
             put32(data, table + k * OffsetSize, get32(data, table + k * OffsetSize) - base);
-        MifReader reader;
-        QVERIFY2(reader.readData(data), qPrintable(reader.errorString()));
-        QCOMPARE(reader.resource(0x10, 1), QByteArray("abc"));
-        QCOMPARE(reader.resource(0x10, 2), QByteArray("defg"));
-
-        QVERIFY(reader.readData(twoBlobFile() + "trailing"));  // bytes after the last blob are ignored
-        QCOMPARE(reader.resource(0x10, 2), QByteArray("defg"));
+        for (const QByteArray& file : {data, twoBlobFile() + "trailing"}) {
+            QVERIFY2(reader.readData(file), qPrintable(reader.errorString()));
+            QCOMPARE(reader.resource(0x10, 1) + reader.resource(0x10, 2), QByteArray("abcdefg"));
+        }
     }
 
-    void moduleHeaderMissingOrShort_data()
-    {
-        QTest::addColumn<QByteArray>("data");
-        QTest::addColumn<bool>("decoded");
-        const QByteArray classes = uint32s({0x01000001});
-        QTest::newRow("no header resource") << moduleFile({{ClassesId, classes}}) << false;
-        QTest::newRow("39-byte header") << moduleFile({{HeaderId, moduleHeader(1, 0, 0, 0, 0, 39)}, {ClassesId, classes}}) << false;
-        QTest::newRow("40-byte header") << moduleFile({{HeaderId, moduleHeader(1, 0, 0, 0, 0)}, {ClassesId, classes}}) << true;
-    }
     void moduleHeaderMissingOrShort()
     {
-        QFETCH(QByteArray, data);
-        QFETCH(bool, decoded);
-        MifReader reader;
-        QVERIFY2(reader.readData(data), qPrintable(reader.errorString()));
-        MifEntry entry = richEntry();
-        QCOMPARE(reader.decodeModule(entry), decoded);
-        if (decoded)
-            QVERIFY(entry.classCount == 1 && entry.classes == QVector<quint32>({0x01000001}) && entry.applets.isEmpty());
-        else
-            QVERIFY(entry == MifEntry());
+        const QByteArray classes = uint32s({0x01000001});
+        for (const int headerSize : {0, 39, 40}) {
+            MifReader reader;
+            QVERIFY(reader.readData(headerSize ? moduleFile({{HeaderId, moduleHeader(1, 0, 0, 0, 0, headerSize)}, {ClassesId, classes}})
+                                               : moduleFile({{ClassesId, classes}})));
+            MifEntry entry = richEntry();
+            QCOMPARE(reader.decodeModule(entry), headerSize == 40);
+            QVERIFY(headerSize == 40 ? entry.classCount == 1 && entry.classes == QVector<quint32>({0x01000001}) && entry.applets.isEmpty()
+                                     : entry == MifEntry());
+        }
     }
 
     void recordDecoding_data()
@@ -329,22 +305,19 @@ private slots:
         QFETCH(QByteArray, data);
         MifReader reader;
         QVERIFY(reader.readData(twoBlobFile()));
-        QVERIFY(!reader.readData(data));
-        QVERIFY(!reader.errorString().isEmpty());
+        QVERIFY(!reader.readData(data) && !reader.errorString().isEmpty());
         // A failed read also drops what an earlier read had loaded.
-        QVERIFY(!reader.hasResource(0x10, 1));
-        QCOMPARE(reader.entryCount(), 0);
-        QCOMPARE(reader.blobCount(), 0);
+        QVERIFY(!reader.hasResource(0x10, 1) && reader.entryCount() == 0 && reader.blobCount() == 0);
         MifEntry entry = richEntry();
         QVERIFY(!reader.decodeModule(entry));
         QVERIFY(entry == MifEntry());
 
         QTemporaryDir dir;
-        QVERIFY(TestSupport::writeFile(dir.filePath("broken.mif"), data));
-        QVERIFY(!reader.readFile(dir.filePath("broken.mif")));
+        QVERIFY(TestSupport::writeFile(dir.filePath("broken.mif"), data) && !reader.readFile(dir.filePath("broken.mif")));
     }
 
-    // The most a file can claim: a full table of entries that each cover every id.
+    // The most a file can claim: a full table of entries that each cover every id; the writer
+    // refuses one entry more.
     void widestCoverage()
     {
         MifWriter writer;
@@ -352,8 +325,7 @@ private slots:
             writer.addBlob(k == 0xFFFF ? QByteArray("top") : QByteArray());
         for (int i = 0; i < MaxEntries - 1; ++i)
             writer.addEntry(1, 0, 0xFFFF, 0);
-        QVERIFY(writer.addEntry(2, 40000, 0, 7));
-        QVERIFY(!writer.addEntry(3, 0, 0, 0));
+        QVERIFY(writer.addEntry(2, 40000, 0, 7) && !writer.addEntry(3, 0, 0, 0));
         MifReader reader;
         QVERIFY2(reader.readData(writer.data()), qPrintable(reader.errorString()));
         QCOMPARE(reader.entryCount(), MaxEntries);

@@ -1,12 +1,7 @@
-#include "IdFormat.h"
 #include "NameDatabases.h"
-#include "NameLibrary.h"
 #include "TestSupport.h"
 
 #include <QBuffer>
-#include <QCoreApplication>
-#include <QDomDocument>
-#include <QSet>
 #include <QTemporaryDir>
 #include <QTest>
 
@@ -18,19 +13,6 @@ QStringList classNames(const NameDatabases& db, const QString& idText)
     QString name, family, subFamily;
     db.lookupClass(idText, name, family, subFamily);
     return {name, family, subFamily};
-}
-
-// The id attributes of the direct children named element of a shipped database.
-QStringList shippedIds(const QString& fileName, const QString& element)
-{
-    QFile file(QCoreApplication::applicationDirPath() + QLatin1Char('/') + fileName);
-    QDomDocument document;
-    if (!file.open(QIODevice::ReadOnly) || !document.setContent(&file))
-        return {};
-    QStringList result;
-    for (QDomElement e = document.documentElement().firstChildElement(element); !e.isNull(); e = e.nextSiblingElement(element))
-        result << e.attribute(QStringLiteral("id"));
-    return result;
 }
 
 } // namespace
@@ -173,25 +155,6 @@ private slots:
         once.initialize(m_dir.path());
         QCOMPARE(classNames(once, "0x00000002").first(), QString("Added"));
         QCOMPARE(classNames(once, "0x00000001").first(), QString("not found"));
-    }
-
-    // Reference-data drift: shipped ids unique and in formatted form, classes with a family.
-    void shippedDatabases()
-    {
-        const QStringList classIds = shippedIds("ClassDB.xml", "class");
-        QVERIFY2(classIds.size() >= 300, "the databases are not beside the test");
-        for (const QStringList& list : {classIds, shippedIds("InterfaceDB.xml", "interface"), shippedIds("PriviledgeDB.xml", "priviledge")}) {
-            QVERIFY(!list.isEmpty());
-            QCOMPARE(QSet<QString>(list.cbegin(), list.cend()).size(), list.size());
-            for (const QString& id : list)
-                QCOMPARE(formatId(parseHexId(id)), id);
-        }
-        initializeLibrary();
-        for (const QString& id : classIds) {
-            QString idText, name, family, subFamily;
-            lookupClass(parseHexId(id), idText, name, family, subFamily);
-            QVERIFY2(name != "not found" && !family.isEmpty() && !subFamily.isEmpty(), qPrintable(id));
-        }
     }
 };
 

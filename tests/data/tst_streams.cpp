@@ -10,32 +10,27 @@ class TestStreams : public QObject
     Q_OBJECT
 
 private slots:
-    // The MIF loops rely on a short read giving 0 and consuming nothing.
-    void shortVectorRead_data()
+    // The MIF loops rely on a short read giving 0, consuming nothing and ending the stream;
+    // negative counts are refused.
+    void shortReads()
     {
-        QTest::addColumn<QByteArray>("data");
-        QTest::addColumn<int>("width");
-        QTest::addColumn<int>("consumedBefore");
-        QTest::newRow("uint32 from 3 bytes") << QByteArray("\1\2\3") << 4 << 0;
-        QTest::newRow("uint16 from 1 byte") << QByteArray("\1") << 2 << 0;
-        QTest::newRow("uint8 from nothing") << QByteArray() << 1 << 0;
-        QTest::newRow("uint32 after 2 of 5 bytes") << QByteArray("\1\2\3\4\5") << 4 << 2;
-    }
-    void shortVectorRead()
-    {
-        QFETCH(QByteArray, data);
-        QFETCH(int, width);
-        QFETCH(int, consumedBefore);
-        QVectorStream stream(data);
-        for (int i = 0; i < consumedBefore; ++i)
-            stream.readUInt8();
-        QVERIFY(!stream.atEnd() && !stream.hasError());
-        const quint32 value = width == 1 ? stream.readUInt8() : width == 2 ? stream.readUInt16() : stream.readUInt32();
-        QCOMPARE(value, 0u);
-        QVERIFY(stream.atEnd() && stream.hasError());
-        QCOMPARE(stream.position(), qint64(consumedBefore));
-        if (consumedBefore < data.size())
+        for (const int consumedBefore : {0, 2}) {
+            const QByteArray data = QByteArray("\1\2\3\4\5").left(3 + consumedBefore);
+            QVectorStream stream(data);
+            for (int i = 0; i < consumedBefore; ++i)
+                stream.readUInt8();
+            QVERIFY(!stream.atEnd() && !stream.hasError());
+            QCOMPARE(stream.readUInt32(), 0u);
+            QVERIFY(stream.atEnd() && stream.hasError());
+            QCOMPARE(stream.position(), qint64(consumedBefore));
             QCOMPARE(int(stream.readUInt8()), int(data.at(consumedBefore)));
+        }
+        char buffer[4] = {};
+        QVectorStream stream(QByteArray("\1\2\3\4"));
+        QVERIFY(!stream.readBytes(buffer, -1) && stream.hasError());
+        QCOMPARE(stream.position(), qint64(0));
+        QVectorStream writer;
+        QVERIFY(!writer.writeBytes(buffer, -4) && writer.hasError() && writer.data().isEmpty());
     }
 
     // One of the two orders is the machine's, the other is swapped both ways.
@@ -49,7 +44,6 @@ private slots:
         QTest::newRow("16 big") << int(QStream::BigEndian) << 2 << QByteArray("\x12\x34") << 0x1234u;
         QTest::newRow("32 little") << int(QStream::LittleEndian) << 4 << QByteArray("\x78\x56\x34\x12") << 0x12345678u;
         QTest::newRow("32 big") << int(QStream::BigEndian) << 4 << QByteArray("\x12\x34\x56\x78") << 0x12345678u;
-        QTest::newRow("8 big") << int(QStream::BigEndian) << 1 << QByteArray("\x12") << 0x12u;
     }
     void byteOrder()
     {
@@ -58,25 +52,11 @@ private slots:
         QFETCH(QByteArray, bytes);
         QFETCH(quint32, value);
         QVectorStream writer(QByteArray(), order);
-        width == 1 ? writer.writeUInt8(quint8(value)) : width == 2 ? writer.writeUInt16(quint16(value))
-                                                                    : writer.writeUInt32(value);
+        width == 2 ? writer.writeUInt16(quint16(value)) : writer.writeUInt32(value);
         QCOMPARE(writer.data(), bytes);
         QVectorStream reader(bytes, order);
-        QCOMPARE(width == 1 ? reader.readUInt8() : width == 2 ? reader.readUInt16() : reader.readUInt32(), value);
+        QCOMPARE(width == 2 ? reader.readUInt16() : reader.readUInt32(), value);
         QVERIFY(!reader.hasError() && !writer.hasError());
-    }
-
-    void negativeCounts()
-    {
-        char buffer[4] = {};
-        QVectorStream stream(QByteArray("\1\2\3\4"));
-        QVERIFY(!stream.readBytes(buffer, -1));
-        QVERIFY(stream.hasError());
-        QCOMPARE(stream.position(), qint64(0));
-        QVectorStream writer;
-        QVERIFY(!writer.writeBytes(buffer, -4));
-        QVERIFY(writer.hasError());
-        QVERIFY(writer.data().isEmpty());
     }
 
     void binaryStreamOnFile()
@@ -97,13 +77,11 @@ private slots:
         QBinaryStream in(&input);
         QCOMPARE(in.readUInt16(), quint16(0x2233));
         QVERIFY(!in.hasError());
-        QCOMPARE(in.readUInt32(), 0u);  // only one byte left
+        QCOMPARE(in.readUInt32(), 0u); // only one byte left
         QVERIFY(in.hasError() && in.atEnd());
-
         QBinaryStream noWrite(&input);
         noWrite.writeUInt8(quint8(1));
         QVERIFY(noWrite.hasError());
-
         QFile closed(path);
         QBinaryStream unopened(&closed);
         QVERIFY(unopened.hasError());

@@ -1,6 +1,6 @@
 // Every XML reader refuses what would cost more time or memory than the file's size
 // (declared entities, deep nesting, huge attributes, huge files) with a message naming the
-// file, and still reads what the program ships and writes.
+// file: the limits are checked once on the policy, and each reader is checked to use it.
 #include "LevelDefinition.h"
 #include "NameDatabases.h"
 #include "TestSupport.h"
@@ -10,83 +10,39 @@
 #include "DeviceProfileParser.h"
 #endif
 
-#include <QCoreApplication>
 #include <QDomDocument>
-#include <QFile>
 #include <QTemporaryDir>
 #include <QTest>
 
-#include <algorithm>
-
 namespace {
 
-// A document the reader takes is open + body + close, with one record in open.
-struct Reader
-{
-    QString name;
-    QByteArray open;
-    QByteArray close;
-    qint64 maxBytes;
-};
+const QByteArray DtdBlowUp = "<!DOCTYPE r [<!ENTITY e \"" + QByteArray(4000, 'x') + "\">]>";
 
-QList<Reader> readers()
-{
-    QList<Reader> list{
-        {"name database", R"(<classes><class id="0x01011001" name="Heap"/>)", "</classes>", XmlReadPolicy::DatabaseFileBytes},
-        {"level file", R"(<level><Id value="0x01011001" name="Heap"/>)", "</level>", XmlReadPolicy::DatabaseFileBytes},
-    };
-#ifdef DELVIX_WITH_SIM
-    list.append({"device profile", R"(<device id="t" name="T"><volume id="1" mount="/" folder="flash"/>)", "</device>",
-                 XmlReadPolicy::ProfileFileBytes});
-#endif
-    return list;
-}
+QByteArray nested(int levels) { return QByteArray("<n>").repeated(levels) + QByteArray("</n>").repeated(levels); }
+QByteArray attributeOf(qsizetype chars) { return "<x a=\"" + QByteArray(chars, 'a') + "\"/>"; }
 
-Reader readerNamed(const QString& name)
-{
-    const QList<Reader> all = readers();
-    return *std::find_if(all.cbegin(), all.cend(), [&name](const Reader& r) { return r.name == name; });
-}
-
-// The records the reader found (classes, level ids or volumes), or -1 with its message.
+// The records a reader found in path (classes, level ids or volumes), or -1 with its message.
 int readAs(const QString& reader, const QString& path, QString& error)
 {
     if (reader == "name database") {
         QFile file(path);
         QList<IdRecord> entries;
-        if (!file.open(QIODevice::ReadOnly) || !NameDatabases::readEntries(&file, "class", entries, &error))
-            return -1;
-        return int(entries.size());
+        const bool read = file.open(QIODevice::ReadOnly) && NameDatabases::readEntries(&file, "class", entries, &error);
+        return read ? int(entries.size()) : -1;
     }
     if (reader == "level file") {
         LevelDefinition level;
-        if (!level.load(path)) {
-            error = level.errorString();
-            return -1;
-        }
-        return int(level.records().size());
+        error = level.load(path) ? QString() : level.errorString();
+        return error.isEmpty() ? int(level.records().size()) : -1;
     }
 #ifdef DELVIX_WITH_SIM
     DeviceProfileParser parser;
     DeviceProfile profile;
-    if (!parser.parseFile(path, profile)) {
-        error = parser.errorString();
-        return -1;
-    }
-    return int(profile.volumes.size());
+    error = parser.parseFile(path, profile) ? QString() : parser.errorString();
+    return error.isEmpty() ? int(profile.volumes.size()) : -1;
 #else
     return -1;
 #endif
-}
-
-QByteArray nested(int levels)
-{
-    return QByteArray("<n>").repeated(levels) + QByteArray("</n>").repeated(levels);
-}
-
-QByteArray attributeOf(qsizetype chars)
-{
-    return "<x a=\"" + QByteArray(chars, 'a') + "\"/>";
 }
 
 // head, spaces up to size bytes in all, then tail; written in pieces, as the file may be large.
@@ -110,99 +66,76 @@ class TestXmlPolicy : public QObject
     Q_OBJECT
 
 private slots:
-    // prolog goes before the root, body inside it; a fileSize pads the body with spaces.
-    void readerRefusesBreach_data()
+    void limits_data()
     {
-        QTest::addColumn<QString>("reader");
-        QTest::addColumn<QByteArray>("prolog");
-        QTest::addColumn<QByteArray>("body");
-        QTest::addColumn<qint64>("fileSize");
-        QTest::addColumn<QString>("message");
+        QTest::addColumn<QByteArray>("xml");
+        QTest::addColumn<QString>("message"); // empty: accepted
         // Small enough that an unchecked parse expands it quickly: the DTD alone is refused.
-        const QByteArray blowUp = "<!DOCTYPE r [<!ENTITY e \"" + QByteArray(4000, 'x') + "\">]>";
-        for (const Reader& r : readers()) {
-            const auto row = [&r](const char* attack) -> QTestData& { return QTest::addRow("%s: %s", qPrintable(r.name), attack); };
-            row("entity blow-up") << r.name << blowUp << "<x>" + QByteArray("&e;").repeated(1000) + "</x>" << qint64(0)
-                                  << "a DTD is not accepted";
-            row("internal subset") << r.name << QByteArray("<!DOCTYPE r [<!ELEMENT r ANY>]>") << QByteArray() << qint64(0)
-                                   << "a DTD is not accepted";
-            row("external DTD") << r.name << QByteArray("<!DOCTYPE r SYSTEM \"r.dtd\">") << QByteArray() << qint64(0)
-                                << "a DTD is not accepted";
-            row("65 levels") << r.name << QByteArray() << nested(64) << qint64(0) << "nesting deeper than 64 levels";
-            row("attribute over 64 KiB") << r.name << QByteArray() << attributeOf(XmlReadPolicy::MaxAttributeChars + 1)
-                                         << qint64(0) << "attribute \"a\" on line 1 longer than 65536 characters";
-            row("file one byte over") << r.name << QByteArray() << QByteArray() << r.maxBytes + 1
-                                      << QString("larger than %1 bytes").arg(r.maxBytes);
+        QTest::newRow("entity blow-up") << DtdBlowUp + "<r>" + QByteArray("&e;").repeated(1000) + "</r>" << "a DTD is not accepted";
+        QTest::newRow("internal subset") << QByteArray("<!DOCTYPE r [<!ELEMENT r ANY>]><r/>") << "a DTD is not accepted";
+        QTest::newRow("external DTD") << QByteArray("<!DOCTYPE r SYSTEM \"r.dtd\"><r/>") << "a DTD is not accepted";
+        QTest::newRow("65 levels") << nested(65) << "nesting deeper than 64 levels";
+        QTest::newRow("attribute over 64 KiB") << attributeOf(XmlReadPolicy::MaxAttributeChars + 1)
+                                               << "attribute \"a\" on line 1 longer than 65536 characters";
+        // The bare DOCTYPE is what the program's own exports write.
+        QTest::newRow("bare DOCTYPE") << QByteArray("<!DOCTYPE zant-class-ids>\n<r/>") << "";
+        QTest::newRow("64 levels") << nested(64) << "";
+        QTest::newRow("attribute of 64 KiB") << attributeOf(XmlReadPolicy::MaxAttributeChars) << "";
+    }
+    void limits()
+    {
+        QFETCH(QByteArray, xml);
+        QFETCH(QString, message);
+        XmlReadPolicy policy(XmlReadPolicy::DatabaseFileBytes);
+        QDomDocument document;
+        QCOMPARE(policy.parse(xml, QStringLiteral("in.xml"), document), message.isEmpty());
+        QVERIFY2(policy.errorString().startsWith(message.isEmpty() ? QString() : QStringLiteral("in.xml: ") + message),
+                 qPrintable(policy.errorString()));
+        // The file limit, at a size a test can write.
+        QTemporaryDir dir;
+        const QString path = dir.filePath("r.xml");
+        for (const qint64 limit : {qint64(xml.size()), qint64(xml.size()) - 1}) {
+            XmlReadPolicy small(limit);
+            QVERIFY(TestSupport::writeFile(path, xml));
+            QCOMPARE(small.readFile(path, document), message.isEmpty() && limit == xml.size());
+            QVERIFY(limit == xml.size() || small.errorString() == QStringLiteral("%1: larger than %2 bytes").arg(path).arg(limit));
         }
     }
-    void readerRefusesBreach()
-    {
-        QFETCH(QString, reader);
-        QFETCH(QByteArray, prolog);
-        QFETCH(QByteArray, body);
-        QFETCH(qint64, fileSize);
-        QFETCH(QString, message);
-        const Reader r = readerNamed(reader);
-        QTemporaryDir dir;
-        const QString path = dir.filePath("input.xml");
-        QVERIFY(writePadded(path, prolog + r.open + body, r.close, fileSize));
 
-        QString error;
-        QCOMPARE(readAs(reader, path, error), -1);
-        QVERIFY2(error.startsWith(path + ": "), qPrintable(error));
-        QVERIFY2(error.contains(message), qPrintable(error));
-    }
-
-    // Just inside each limit, and the bare DOCTYPE the program's own exports write.
-    void readerAcceptsWithinLimits_data()
+    // Each reader goes through the policy, with its own file limit.
+    void readersUseThePolicy_data()
     {
         QTest::addColumn<QString>("reader");
-        QTest::addColumn<QByteArray>("prolog");
-        QTest::addColumn<QByteArray>("body");
-        for (const Reader& r : readers()) {
-            const auto row = [&r](const char* attack) -> QTestData& { return QTest::addRow("%s: %s", qPrintable(r.name), attack); };
-            row("bare DOCTYPE") << r.name << QByteArray("<!DOCTYPE zant-class-ids>\n") << QByteArray(" <x/>\n");
-            row("64 levels") << r.name << QByteArray() << nested(63);
-            row("attribute of 64 KiB") << r.name << QByteArray() << attributeOf(XmlReadPolicy::MaxAttributeChars);
-        }
-    }
-    void readerAcceptsWithinLimits()
-    {
-        QFETCH(QString, reader);
-        QFETCH(QByteArray, prolog);
-        QFETCH(QByteArray, body);
-        const Reader r = readerNamed(reader);
-        QTemporaryDir dir;
-        const QString path = dir.filePath("input.xml");
-        QVERIFY(TestSupport::writeFile(path, prolog + r.open + body + r.close));
-
-        QString error;
-        QCOMPARE(readAs(reader, path, error), 1);
-    }
-
-    void shippedFilesPass_data()
-    {
-        QTest::addColumn<QString>("path");
+        QTest::addColumn<QByteArray>("open");  // a document with one record is open + close
+        QTest::addColumn<QByteArray>("close");
         QTest::addColumn<qint64>("maxBytes");
-        const QDir bin(QCoreApplication::applicationDirPath());
-        for (const char* name : {"ClassDB.xml", "InterfaceDB.xml", "PriviledgeDB.xml"})
-            QTest::newRow(name) << bin.filePath(name) << XmlReadPolicy::DatabaseFileBytes;
-        const QDir levels(bin.filePath("Levels"));
-        for (const QString& name : levels.entryList({"*.xml"}, QDir::Files))
-            QTest::newRow(qPrintable(name)) << levels.filePath(name) << XmlReadPolicy::DatabaseFileBytes;
+        const qint64 database = XmlReadPolicy::DatabaseFileBytes;
+        QTest::newRow("name database") << "name database" << QByteArray(R"(<classes><class id="0x01011001" name="Heap"/>)")
+                                       << QByteArray("</classes>") << database;
+        QTest::newRow("level file") << "level file" << QByteArray(R"(<level><Id value="0x01011001" name="Heap"/>)")
+                                    << QByteArray("</level>") << database;
 #ifdef DELVIX_WITH_SIM
-        for (const char* image : {"handset", "simulator"})
-            QTest::newRow(image) << QString(DELVIX_SAMPLES_DIR "/devices/%1/device.xml").arg(image) << XmlReadPolicy::ProfileFileBytes;
+        QTest::newRow("device profile") << "device profile" << QByteArray(R"(<device id="t" name="T"><volume id="1" mount="/" folder="flash"/>)")
+                                        << QByteArray("</device>") << XmlReadPolicy::ProfileFileBytes;
 #endif
     }
-    void shippedFilesPass()
+    void readersUseThePolicy()
     {
-        QFETCH(QString, path);
+        QFETCH(QString, reader);
+        QFETCH(QByteArray, open);
+        QFETCH(QByteArray, close);
         QFETCH(qint64, maxBytes);
-        XmlReadPolicy policy(maxBytes);
-        QDomDocument document;
-        QVERIFY2(policy.readFile(path, document), qPrintable(policy.errorString()));
-        QVERIFY(!document.documentElement().firstChildElement().isNull());
+        QTemporaryDir dir;
+        const QString path = dir.filePath("input.xml");
+        QString error;
+        QVERIFY(TestSupport::writeFile(path, "<!DOCTYPE zant-class-ids>" + open + nested(60) + close));
+        QCOMPARE(readAs(reader, path, error), 1);
+        QVERIFY(TestSupport::writeFile(path, DtdBlowUp + open + close));
+        QCOMPARE(readAs(reader, path, error), -1);
+        QVERIFY2(error.startsWith(path + ": a DTD is not accepted"), qPrintable(error));
+        QVERIFY(writePadded(path, open, close, maxBytes + 1));
+        QCOMPARE(readAs(reader, path, error), -1);
+        QCOMPARE(error, QStringLiteral("%1: larger than %2 bytes").arg(path).arg(maxBytes));
     }
 };
 

@@ -123,7 +123,8 @@ private slots:
         m_sockets.reset();
     }
 
-    void discovery()
+    // Discovery, and a device that refuses to be connected.
+    void discoveryAndRefusedConnect()
     {
         QList<QPair<QString, QString>> devices { qMakePair(QStringLiteral("left"), QStringLiteral("over")) };
         QCOMPARE(Portlex::GetDevices(devices), 0u);
@@ -132,37 +133,19 @@ private slots:
         QVERIFY(makeStaleSocket(m_sockets->filePath(QStringLiteral("crashed.sock"))));
         QVERIFY(writeFile(m_sockets->filePath(QStringLiteral("notes.txt")), "note"));
         QCOMPARE(Portlex::GetDevices(devices), 0u);
-
-        SimulatorProcess first(m_sockets->path()), second(m_sockets->path());
-        QVERIFY2(first.start(m_image->path(), QStringLiteral("dev-a")), qPrintable(first.errorString()));
-        QVERIFY2(second.start(m_image->path(), QStringLiteral("dev-b")), qPrintable(second.errorString()));
-        QCOMPARE(Portlex::GetDevices(devices), 2u);
-        QVERIFY(devices.contains(qMakePair(Name, QStringLiteral("dev-a"))));
-        QVERIFY(devices.contains(qMakePair(Name, QStringLiteral("dev-b"))));
-        QCOMPARE(Portlex::GetDevice(QStringLiteral("dev-a"))->name, Name);
-        QVERIFY(!Portlex::GetDevice(QStringLiteral("dev-a"))->Connected());
-        QVERIFY(Portlex::GetDevice(QStringLiteral("nobody")).isNull());
-
-        // A crashed device leaves its socket behind; it is no longer listed, but its object
-        // stays known so that holders can use it again once it is back.
-        second.kill();
-        QCOMPARE(Portlex::GetDevices(devices), 1u);
-        QCOMPARE(devices.first().second, QStringLiteral("dev-a"));
-        QVERIFY(!Portlex::GetDevice(QStringLiteral("dev-b")).isNull());
-    }
-
-    void refusedConnect()
-    {
         QVERIFY(!Portlex::ConnectDevice(QSharedPointer<_ZantDevice>(), QString(), QString()));
         QCOMPARE(Portlex::LastError(), unsigned(PortlexError::InvalidArgument));
 
-        SimulatorProcess refusing(m_sockets->path());
-        QVERIFY(refusing.start(m_image->path(), QStringLiteral("locked"),
-                               { QStringLiteral("--refuse-connect"), QStringLiteral("77:Handset locked by operator") }));
-        QList<QPair<QString, QString>> devices;
-        QCOMPARE(Portlex::GetDevices(devices), 1u);
-        const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(QStringLiteral("locked"));
-        QVERIFY(device);
+        SimulatorProcess first(m_sockets->path()), refusing(m_sockets->path());
+        QVERIFY2(first.start(m_image->path(), QStringLiteral("dev-a")), qPrintable(first.errorString()));
+        QVERIFY2(refusing.start(m_image->path(), QStringLiteral("dev-b"), { "--refuse-connect", "77:Handset locked by operator" }),
+                 qPrintable(refusing.errorString()));
+        QCOMPARE(Portlex::GetDevices(devices), 2u);
+        QVERIFY(devices.contains(qMakePair(Name, QStringLiteral("dev-a"))) && devices.contains(qMakePair(Name, QStringLiteral("dev-b"))));
+        QVERIFY(!Portlex::GetDevice(QStringLiteral("dev-a"))->Connected());
+        QVERIFY(Portlex::GetDevice(QStringLiteral("nobody")).isNull());
+        const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(QStringLiteral("dev-b"));
+        QVERIFY(device && device->name == Name);
         QVERIFY(!Portlex::ConnectDevice(device, QString(), QString()));
         QCOMPARE(Portlex::LastError(), 77u);
         QCOMPARE(Portlex::LastStatus(), QStringLiteral("Handset locked by operator"));
@@ -170,8 +153,12 @@ private slots:
         QVector<ModuleInfo> modules;
         QCOMPARE(device->GetModules(modules, nullptr, nullptr), int(PortlexError::NotConnected));
 
-        // A device that went away since it was listed.
-        refusing.stop();
+        // A crashed device leaves its socket behind; it is no longer listed, but its object
+        // stays known so that holders can use it again once it is back.
+        refusing.kill();
+        QCOMPARE(Portlex::GetDevices(devices), 1u);
+        QCOMPARE(devices.first().second, QStringLiteral("dev-a"));
+        QCOMPARE(Portlex::GetDevice(QStringLiteral("dev-b")), device);
         QVERIFY(!Portlex::ConnectDevice(device, QString(), QString()));
         QCOMPARE(Portlex::LastError(), unsigned(PortlexError::Unreachable));
         QVERIFY(!Portlex::LastStatus().isEmpty());
@@ -232,46 +219,36 @@ private slots:
         QCOMPARE(device->TepStatus(mode, owner, expiry), EnablementEnabled);
         QCOMPARE(owner, QStringLiteral("Tester"));
         QVERIFY(device->GlobalTestSigStatus(mode, owner, expiry) != EnablementEnabled);
-        // A lock request rides on the next call, whichever thread makes it, and is then cleared.
-        device->serviceLockRequest = true;
-        QCOMPARE(callOnWorker([&] { return device->GetVolumes(volumes); }, HangLimitMs), 0);
-        QVERIFY(!device->serviceLockRequest);
-        QCOMPARE(device->TepStatus(mode, owner, expiry), EnablementDisabled);
-    }
-
-    void eightThreadsShareOneDevice()
-    {
-        const QSharedPointer<_ZantDevice> device = serve();
-        QVERIFY(device);
-        QVector<ModuleInfo> reference;
-        QCOMPARE(device->GetModules(reference, nullptr, nullptr), 0);
-
+        // Eight threads and the GUI thread share the device.
         std::atomic<int> failures { 0 };
         std::vector<std::unique_ptr<QThread>> threads;
         for (int t = 0; t < 8; ++t) {
             threads.emplace_back(QThread::create([&, t] {
                 for (int i = 0; i < 40; ++i) {
-                    QVector<ModuleInfo> modules;
-                    QSet<VolumeInfo> volumes;
-                    auto node = QSharedPointer<_SettingsInfo>::create();
-                    node->SetPath(QStringLiteral("/appinfo"));
-                    QString mode, owner, expiry;
-                    failures += (t % 2 == 0 ? device->GetModules(modules, nullptr, nullptr) != 0 || modules != reference
-                                            : device->GetVolumes(volumes) != 0 || volumes.size() != 2)
-                        || device->GetChildSettings(node) != 0 || node->children.size() != 2
-                        || device->TepStatus(mode, owner, expiry) != EnablementEnabled;
+                    QVector<ModuleInfo> own;
+                    QSet<VolumeInfo> ownVolumes;
+                    auto calc = QSharedPointer<_SettingsInfo>::create();
+                    calc->SetPath(QStringLiteral("/appinfo/calc"));
+                    QString m, o, e;
+                    failures += (t % 2 == 0 ? device->GetModules(own, nullptr, nullptr) != 0 || own != modules
+                                            : device->GetVolumes(ownVolumes) != 0 || ownVolumes != volumes)
+                        || device->GetChildSettings(calc) != 0 || calc->values.size() != 1
+                        || device->TepStatus(m, o, e) != EnablementEnabled;
                 }
             }));
             threads.back()->start();
         }
-        // The GUI thread keeps using the device meanwhile.
-        for (int i = 0; i < 40; ++i) {
-            QVector<ProcessInfo> processes;
+        for (int i = 0; i < 40; ++i)
             failures += device->GetProcesses(processes) != 0;
-        }
         for (auto& thread : threads)
             QVERIFY(thread->wait(60000));
         QCOMPARE(failures.load(), 0);
+
+        // A lock request rides on the next call, whichever thread makes it, and is then cleared.
+        device->serviceLockRequest = true;
+        QCOMPARE(callOnWorker([&] { return device->GetVolumes(volumes); }, HangLimitMs), 0);
+        QVERIFY(!device->serviceLockRequest);
+        QCOMPARE(device->TepStatus(mode, owner, expiry), EnablementDisabled);
     }
 
     void simulatorKilledAndRestarted()
@@ -411,27 +388,12 @@ private slots:
         QCOMPARE(modulesAfter, modulesBefore);
     }
 
-    void uploadCutByKillLeavesNothing()
-    {
-        // Slow answers keep the transfer going long enough to be cut in the middle.
-        const QSharedPointer<_ZantDevice> device = serve(LargeVolume, SlowAnswers);
-        QVERIFY(device);
-        QVERIFY(writeFile(local(QStringLiteral("big.bin")), randomBytes(64 * 1024 * 1024, 4)));
-        QVERIFY(cutByKill([&] { return device->CopyFileToDevice(local(QStringLiteral("big.bin")), QStringLiteral("/user/big.bin")); },
-                          [&] { return !leftovers(flash(QStringLiteral("user"))).isEmpty(); }));
-        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/big.bin"))));
-
-        // The restarted device clears what the crash left, and works again.
-        QVERIFY2(m_simulator->start(m_image->path(), DeviceId, {}, SimulatorProcess::Image::InPlace),
-                 qPrintable(m_simulator->errorString()));
-        QCOMPARE(leftovers(flash()), QStringList());
-        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/big.bin"))));
-        QCOMPARE(device->CopyFileToPC(QStringLiteral("/user/notes.txt"), local(QStringLiteral("n.txt"))), 0);
-    }
-
-    void downloadCutByKillLeavesNothing()
+    // A device crash in the middle of a transfer leaves no partial file on either side; the
+    // restarted device clears what the crash left, and works again.
+    void transfersCutByKillLeaveNothing()
     {
         m_image->writeFile(QStringLiteral("flash/user/big.bin"), randomBytes(64 * 1024 * 1024, 5));
+        // Slow answers keep the transfers going long enough to be cut in the middle.
         const QSharedPointer<_ZantDevice> device = serve(LargeVolume, SlowAnswers);
         QVERIFY(device);
         const QString target = local(QStringLiteral("target"));
@@ -440,6 +402,17 @@ private slots:
         QVERIFY(cutByKill([&] { return device->CopyFileToPC(QStringLiteral("/user/big.bin"), target + QStringLiteral("/big.bin")); },
                           [&] { return writesInto(target); }));
         QCOMPARE(treeEntries(target), QStringList());
+
+        QVERIFY2(m_simulator->start(m_image->path(), DeviceId, SlowAnswers, SimulatorProcess::Image::InPlace),
+                 qPrintable(m_simulator->errorString()));
+        QVERIFY(writeFile(local(QStringLiteral("up.bin")), randomBytes(64 * 1024 * 1024, 4)));
+        QVERIFY(cutByKill([&] { return device->CopyFileToDevice(local(QStringLiteral("up.bin")), QStringLiteral("/user/up.bin")); },
+                          [&] { return !leftovers(flash(QStringLiteral("user"))).isEmpty(); }));
+        QVERIFY2(m_simulator->start(m_image->path(), DeviceId, {}, SimulatorProcess::Image::InPlace),
+                 qPrintable(m_simulator->errorString()));
+        QCOMPARE(leftovers(flash()), QStringList());
+        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/up.bin"))));
+        QCOMPARE(device->CopyFileToPC(QStringLiteral("/user/notes.txt"), local(QStringLiteral("n.txt"))), 0);
     }
 
     void installShowsTheModule()
@@ -476,52 +449,11 @@ private slots:
         QVERIFY(device->statusText.contains(QLatin1String("no volume 9")));
     }
 
-    void runStartsAProcessThatEnds()
+    // How each action uses the resolver: escapes through ".." and through links out, and
+    // run's refusals of what is no module; nothing may change. Then what run and delete do.
+    void runDeleteAndRefusals()
     {
         const QSharedPointer<_ZantDevice> device = serve(LargeVolume, { QStringLiteral("--run-lifetime"), QStringLiteral("300") });
-        QVERIFY(device);
-        const auto running = [&device] {
-            QVector<ProcessInfo> processes;
-            device->GetProcesses(processes);
-            return std::any_of(processes.cbegin(), processes.cend(),
-                               [](const ProcessInfo& p) { return p.name == QLatin1String("userm") && p.threads.size() == 3; });
-        };
-        QVERIFY(!running());
-        QCOMPARE(device->RunApplication(QStringLiteral("/usermod/userm/userm.mod")), 0);
-        QVERIFY(running());
-        QVector<LoadedModuleInfo> loaded;
-        QCOMPARE(device->GetLoadedModules(loaded), 0);
-        QVERIFY(std::any_of(loaded.cbegin(), loaded.cend(), [](const LoadedModuleInfo& p) {
-            return p.name == QLatin1String("userm")
-                && std::any_of(p.modules.cbegin(), p.modules.cend(),
-                               [](const LoadedModuleEntry& m) { return m.location == QLatin1String("/usermod/userm/userm.mod"); });
-        }));
-        QTRY_VERIFY_WITH_TIMEOUT(!running(), 15000);
-    }
-
-    void deleteFilesDirectoriesAndLinks()
-    {
-        const QSharedPointer<_ZantDevice> device = serve();
-        QVERIFY(device);
-        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/notes.txt")), 0);
-        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/notes.txt"))));
-        // The directory goes with its contents; the link inside it is removed, not followed.
-        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/docs")), 0);
-        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/docs"))));
-        // A link that points out of the volume: the link goes, its target stays.
-        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/outfile")), 0);
-        QVERIFY(!QFileInfo(flash(QStringLiteral("user/outfile"))).isSymLink());
-
-        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/notes.txt")), int(PortlexError::NotFound));
-        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/")), int(PortlexError::PathRefused));
-        QVERIFY(QFileInfo(flash(QStringLiteral("user"))).isDir());
-    }
-
-    // How each action uses the resolver: escapes through ".." and through links out, and
-    // run's refusals of what is no module. One device serves every row; nothing may change.
-    void refusals()
-    {
-        const QSharedPointer<_ZantDevice> device = serve();
         QVERIFY(device);
         QVERIFY(writeFile(local(QStringLiteral("payload.mod")), "overwritten"));
         const QByteArray before = treeDigest(flash());
@@ -557,7 +489,34 @@ private slots:
         QVector<ProcessInfo> processesAfter;
         QCOMPARE(device->GetProcesses(processesAfter), 0);
         QCOMPARE(processesAfter.size(), processesBefore.size());
-        // The canary is compared in cleanup.
+
+        const auto running = [&device] {
+            QVector<ProcessInfo> processes;
+            device->GetProcesses(processes);
+            return std::any_of(processes.cbegin(), processes.cend(),
+                               [](const ProcessInfo& p) { return p.name == QLatin1String("userm") && p.threads.size() == 3; });
+        };
+        QVERIFY(!running());
+        QCOMPARE(device->RunApplication(QStringLiteral("/usermod/userm/userm.mod")), 0);
+        QVERIFY(running());
+        QVector<LoadedModuleInfo> loaded;
+        QCOMPARE(device->GetLoadedModules(loaded), 0);
+        QVERIFY(std::any_of(loaded.cbegin(), loaded.cend(), [](const LoadedModuleInfo& p) {
+            return p.name == QLatin1String("userm") && anyHas(p.modules, &LoadedModuleEntry::location, QStringLiteral("/usermod/userm/userm.mod"));
+        }));
+        QTRY_VERIFY_WITH_TIMEOUT(!running(), 15000);
+
+        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/notes.txt")), 0);
+        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/notes.txt"))));
+        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/notes.txt")), int(PortlexError::NotFound));
+        // The directory goes with its contents; the link inside it is removed, not followed.
+        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/docs")), 0);
+        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/docs"))));
+        // A link that points out of the volume: the link goes, its target stays (cleanup checks).
+        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/user/outfile")), 0);
+        QVERIFY(!QFileInfo(flash(QStringLiteral("user/outfile"))).isSymLink());
+        QCOMPARE(device->DeleteDeviceFile(QStringLiteral("/")), int(PortlexError::PathRefused));
+        QVERIFY(QFileInfo(flash(QStringLiteral("user"))).isDir());
     }
 };
 

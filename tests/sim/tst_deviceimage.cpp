@@ -340,7 +340,6 @@ private slots:
         QTest::newRow("upload") << false;
         QTest::newRow("package") << true;
     }
-
     void reservationExpiresWhenIdle()
     {
         QFETCH(bool, package);
@@ -375,7 +374,6 @@ private slots:
         QTest::newRow("Connect failed by a rule") << int(FailedByRule);
         QTest::newRow("refused after an accepted Connect") << int(RefusedLater);
     }
-
     void servesOnlyAfterConnect()
     {
         QFETCH(int, connect);
@@ -450,29 +448,22 @@ private slots:
         QCOMPARE(state().moduleMif(QStringLiteral("big"), entry), qint32(PortlexError::IoError));
     }
 
-    void keepAliveWhileUnpacking_data()
-    {
-        QTest::addColumn<int>("files");
-        QTest::addColumn<int>("fileSize");
-        QTest::addColumn<int>("atLeast");
-        QTest::newRow("one 4 MiB file") << 1 << (4 << 20) << 16;
-        QTest::newRow("320 empty files") << 320 << 0 << 5;
-    }
-
+    // The extractor's heartbeats reach the keep-alive of the device's request, for large
+    // files and for many small ones.
     void keepAliveWhileUnpacking()
     {
-        QFETCH(int, files);
-        QFETCH(int, fileSize);
-        QFETCH(int, atLeast);
-        const QString package = writePackage([&](PackageWriter& w) {
-            for (int i = 0; i < files; ++i)
-                w.addFile(QStringLiteral("m/f%1").arg(i), TestSupport::randomBytes(fileSize, quint32(i)));
-        });
         m_image->writeProfile(TestImage::defaultProfile().replace("size=\"1000000\"", "size=\"100000000\""));
         QVERIFY(m_image->load());
-        int beats = 0; // the extractor's, through the keep-alive of the device's request
-        QCOMPARE(install(package, [&beats] { ++beats; }).result, 0);
-        QVERIFY2(beats >= atLeast, qPrintable(QString::number(beats)));
+        const struct { int files, fileSize, atLeast; } packages[] = {{1, 4 << 20, 16}, {320, 0, 5}};
+        for (const auto& [files, fileSize, atLeast] : packages) {
+            const QString package = writePackage([&](PackageWriter& w) {
+                for (int i = 0; i < files; ++i)
+                    w.addFile(QStringLiteral("m%1/f%2").arg(files).arg(i), TestSupport::randomBytes(fileSize, quint32(i)));
+            });
+            int beats = 0;
+            QCOMPARE(install(package, [&beats] { ++beats; }).result, 0);
+            QVERIFY2(beats >= atLeast, qPrintable(QString::number(beats)));
+        }
     }
 };
 

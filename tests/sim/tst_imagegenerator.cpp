@@ -1,6 +1,5 @@
 #include "DeviceState.h"
 #include "ImageCopy.h"
-#include "ImageGenerator.h"
 #include "SampleBuilder.h"
 #include "TestSupport.h"
 
@@ -9,7 +8,7 @@
 #include <QTemporaryDir>
 #include <QtTest>
 
-// The image writers: the committed samples, the synthetic benchmark image and --reset's copy.
+// The image writers: the committed samples and --reset's copy.
 class TestImageGenerator : public QObject
 {
     Q_OBJECT
@@ -44,24 +43,6 @@ private slots:
             const auto available = std::count_if(cache.classes.cbegin(), cache.classes.cend(), [](const IdRecord& r) { return r.available; });
             QVERIFY(!state.modules().isEmpty() && available > 0 && available < cache.classes.size()); // some are known but missing
         }
-    }
-
-    void generatedImageHasTheRequestedSize()
-    {
-        QTemporaryDir dir;
-        ImageGenerator generator;
-        const int modules = ImageGenerator::ModulesPerFolder + 30; // more than one folder's worth
-        QVERIFY2(generator.generate(dir.path(), {modules, 300, 21, 9}), qPrintable(generator.errorString()));
-        DeviceState state;
-        QVERIFY2(state.load(dir.path(), QCoreApplication::applicationDirPath()), qPrintable(state.errorString()));
-        const DeviceCache cache = state.cache();
-        QCOMPARE(state.modules().size(), modules);
-        QCOMPARE(cache.classes.size(), 300);
-        QVERIFY(std::all_of(cache.classes.cbegin(), cache.classes.cend(), [](const IdRecord& r) { return r.available; }));
-        QCOMPARE(state.processes().size(), 9);
-        _DirectoryInfo bulk;
-        QCOMPARE(state.fileSystemLevel(QStringLiteral("/shared/bulk"), bulk), 0);
-        QCOMPARE(bulk.files.size(), 21);
     }
 
     void imageCopyKeepsLinksAsLinks()
