@@ -6,7 +6,6 @@
 #include "TestImage.h"
 #include "TestSupport.h"
 
-#include <QProcess>
 #include <QRegularExpression>
 #include <QTemporaryDir>
 #include <QThread>
@@ -117,10 +116,7 @@ private slots:
         QCOMPARE(treeDigest(canary()), m_canaryDigest);
         Portlex::Destroy();
         DeviceConnection::setCallTimeoutMs(Protocol::CallTimeoutMs);
-        m_simulator.reset();
-        m_image.reset();
-        m_local.reset();
-        m_sockets.reset();
+        m_simulator.reset(); // before its image goes, at the next init
     }
 
     // Discovery, and a device that refuses to be connected.
@@ -251,7 +247,8 @@ private slots:
         QCOMPARE(device->TepStatus(mode, owner, expiry), EnablementDisabled);
     }
 
-    void simulatorKilledAndRestarted()
+    // A device that dies during a call, comes back, then stops.
+    void simulatorKilledRestartedAndStopped()
     {
         const QSharedPointer<_ZantDevice> device = serve(LargeVolume, { QStringLiteral("--latency"), QStringLiteral("1500") });
         QVERIFY(device);
@@ -289,30 +286,24 @@ private slots:
         QCOMPARE(callOnWorker(getModules, HangLimitMs), 0);
         QString mode, owner, expiry;
         QCOMPARE(device->GlobalTestSigStatus(mode, owner, expiry), EnablementDisabled);
-    }
 
-    void stoppedSimulatorTimesOut()
-    {
+        // A stopped device: a fresh connection (another thread) gets no further than the
+        // handshake, the call leaves its output as it was, and discovery skips the device.
         DeviceConnection::setCallTimeoutMs(1000);
-        const QSharedPointer<_ZantDevice> device = serve();
-        QVERIFY(device);
         m_simulator->pause();
-        // A fresh connection (another thread) gets no further than the handshake, and the
-        // call leaves its output as it was.
         QVector<ModuleInfo> kept { ModuleInfo() };
         QCOMPARE(callOnWorker([&] { return device->GetModules(kept, nullptr, nullptr); }, HangLimitMs), int(PortlexError::Timeout));
         QCOMPARE(kept.size(), 1);
         QList<QPair<QString, QString>> devices;
         QCOMPARE(Portlex::GetDevices(devices), 0u);
-
         m_simulator->resume();
         QCOMPARE(device->GetModules(kept, nullptr, nullptr), 0);
         QCOMPARE(Portlex::GetDevices(devices), 1u);
     }
 
     // Byte-exact both ways around the chunk size and through the pipeline; each copy
-    // replaces the one before.
-    void copiesBothWays()
+    // replaces the one before. Then a package install.
+    void copiesAndInstall()
     {
         const QSharedPointer<_ZantDevice> device = serve();
         QVERIFY(device);
@@ -331,6 +322,34 @@ private slots:
                 return f->Name() == QLatin1String("copied.bin") && f->size == quint64(bytes.size());
             }));
         }
+
+        // Install updates modules, registry and classes; installing again replaces the module.
+        QVERIFY(!device->cache.classes.value(QStringLiteral("0x01011002")).available);
+        const QString tuner = local(QStringLiteral("tuner"));
+        QString error;
+        QVERIFY(SampleBuilder::writeModule(tuner, TestImage::module(QStringLiteral("tuner"), { 0x01011002 },
+                                                                    { { 0x01011002, 0x01011001, QStringLiteral("audio/x-tuner") } }), &error)
+                && PackageWriter::pack(tuner, local(QStringLiteral("tuner.zantro")), &error));
+
+        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 1), 0);
+        QCOMPARE(device->statusText, QStringLiteral("Package tuner.zantro installed"));
+        QCOMPARE(readFile(flash(QStringLiteral("usermod/tuner/tuner.mif"))), readFile(tuner + QStringLiteral("/tuner.mif")));
+        QCOMPARE(leftovers(flash()), QStringList());
+        QVector<ModuleInfo> modules;
+        QVERIFY(device->GetModules(modules, nullptr, nullptr) == 0
+                && anyHas(modules, &ModuleInfo::path, QStringLiteral("/usermod/tuner/tuner.mif")));
+        QVector<RegistryInfo> registry;
+        QVERIFY(device->GetRegistry(registry, nullptr, nullptr) == 0
+                && anyHas(registry, &RegistryInfo::mimeType, QStringLiteral("audio/x-tuner")));
+        QVERIFY(Portlex::ConnectDevice(device, QString(), QString()));
+        QVERIFY(device->cache.classes.value(QStringLiteral("0x01011002")).available);
+
+        // Installing again replaces the module rather than failing or doubling it.
+        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 1), 0);
+        QCOMPARE(device->GetModules(modules, nullptr, nullptr), 0);
+        QCOMPARE(std::count_if(modules.cbegin(), modules.cend(), [](const ModuleInfo& m) { return m.name == QLatin1String("tuner"); }), 1);
+        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 9), int(PortlexError::NotFound));
+        QVERIFY(device->statusText.contains(QLatin1String("no volume 9")));
     }
 
     void failuresChangeNothing()
@@ -413,40 +432,6 @@ private slots:
         QCOMPARE(leftovers(flash()), QStringList());
         QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/up.bin"))));
         QCOMPARE(device->CopyFileToPC(QStringLiteral("/user/notes.txt"), local(QStringLiteral("n.txt"))), 0);
-    }
-
-    void installShowsTheModule()
-    {
-        const QSharedPointer<_ZantDevice> device = serve();
-        QVERIFY(device);
-        QVERIFY(!device->cache.classes.value(QStringLiteral("0x01011002")).available);
-        const QString tuner = local(QStringLiteral("tuner"));
-        QString error;
-        QVERIFY2(SampleBuilder::writeModule(tuner, TestImage::module(QStringLiteral("tuner"), { 0x01011002 },
-                                                                     { { 0x01011002, 0x01011001, QStringLiteral("audio/x-tuner") } }), &error),
-                 qPrintable(error));
-        QCOMPARE(QProcess::execute(SimulatorProcess::executable(), { QStringLiteral("pack"), tuner, local(QStringLiteral("tuner.zantro")) }), 0);
-
-        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 1), 0);
-        QCOMPARE(device->statusText, QStringLiteral("Package tuner.zantro installed"));
-        QCOMPARE(readFile(flash(QStringLiteral("usermod/tuner/tuner.mif"))), readFile(tuner + QStringLiteral("/tuner.mif")));
-        QCOMPARE(leftovers(flash()), QStringList());
-
-        QVector<ModuleInfo> modules;
-        QVERIFY(device->GetModules(modules, nullptr, nullptr) == 0
-                && anyHas(modules, &ModuleInfo::path, QStringLiteral("/usermod/tuner/tuner.mif")));
-        QVector<RegistryInfo> registry;
-        QVERIFY(device->GetRegistry(registry, nullptr, nullptr) == 0
-                && anyHas(registry, &RegistryInfo::mimeType, QStringLiteral("audio/x-tuner")));
-        QVERIFY(Portlex::ConnectDevice(device, QString(), QString()));
-        QVERIFY(device->cache.classes.value(QStringLiteral("0x01011002")).available);
-
-        // Installing again replaces the module rather than failing or doubling it.
-        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 1), 0);
-        QCOMPARE(device->GetModules(modules, nullptr, nullptr), 0);
-        QCOMPARE(std::count_if(modules.cbegin(), modules.cend(), [](const ModuleInfo& m) { return m.name == QLatin1String("tuner"); }), 1);
-        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 9), int(PortlexError::NotFound));
-        QVERIFY(device->statusText.contains(QLatin1String("no volume 9")));
     }
 
     // How each action uses the resolver: escapes through ".." and through links out, and
