@@ -6,7 +6,6 @@
 #include "StubPage.h"
 #include "TestSupport.h"
 
-#include <QDesktopServices>
 #include <QLabel>
 #include <QLineEdit>
 #include <QPointer>
@@ -33,16 +32,6 @@ public:
     void lowerPriority() override { ++lowers; }
     bool isComplete() override { return statusIsReady(); }
     QString xmlReport() override { return report; }
-};
-
-// Records the files the window hands to the desktop.
-class DesktopSpy : public QObject
-{
-    Q_OBJECT
-public:
-    QList<QUrl> opened;
-public slots:
-    void open(const QUrl& url) { opened << url; }
 };
 
 class DeviceWindowTest : public QObject
@@ -225,25 +214,6 @@ private slots:
         window->SetTimedStatus("third");
         addSlot(window).second->trigger();
         QVERIFY(!timer->isActive());
-    }
-
-    // Through a copy in the temporary folder; names that would land elsewhere open nothing.
-    void deviceFileOpensOnThePC()
-    {
-        QTemporaryDir temporary;
-        const QByteArray previous = qgetenv("TMPDIR");
-        qputenv("TMPDIR", QFile::encodeName(temporary.path()));
-        DesktopSpy desktop;
-        QDesktopServices::setUrlHandler("file", &desktop, "open");
-        DeviceWindow* window = openWindow("aurora");
-        for (const char* path : {"/shared/no-such-file.txt", "/shared/..", "/shared/", "/shared/readme.txt"})
-            window->onFileSystemDoubleClick(path);
-        QDesktopServices::unsetUrlHandler("file");
-        qputenv("TMPDIR", previous);
-        const QString local = temporary.filePath("readme.txt");
-        QCOMPARE(desktop.opened, QList<QUrl>({QUrl::fromLocalFile(local)}));
-        QCOMPARE(TestSupport::readFile(local),
-                 TestSupport::readFile(SimulatorProcess::sampleImage("simulator") + "/flash/shared/readme.txt"));
     }
 
     // The window hands the device record to these pages at once, shown or not.

@@ -1,8 +1,11 @@
 #include "Delvix.h"
 #include "DeviceWindow.h"
 #include "Portlex.h"
+#include "PortlexErrors.h"
+#include "Protocol.h"
 #include "SimulatorProcess.h"
 #include "SplashDialog.h"
+#include "TestSupport.h"
 
 #include <QApplication>
 #include <QLabel>
@@ -18,7 +21,7 @@
 #include <memory>
 
 // The tray application on a display with a real tray host: the start-up balloon, the device
-// menu, the connect step and Exit.
+// menu, the connect step, Exit, and a device that accepts connections but never answers.
 class TrayTest : public QObject
 {
     Q_OBJECT
@@ -51,18 +54,37 @@ class TrayTest : public QObject
         }
         return section;
     }
+    // The device's entry in the menu as it opens now, null while it is not listed.
+    QAction* entry(const QString& targetId)
+    {
+        for (QAction* action : openDeviceSection()) {
+            if (action->property("TargetID").toString() == targetId)
+                return action;
+        }
+        return nullptr;
+    }
     // Chooses the device's entry once the menu lists it.
     bool choose(const QString& targetId)
     {
         return QTest::qWaitFor([&] {
-            for (QAction* action : openDeviceSection()) {
-                if (action->property("TargetID").toString() == targetId) {
-                    action->trigger();
-                    return true;
-                }
-            }
-            return false;
+            QAction* action = entry(targetId);
+            if (action)
+                action->trigger();
+            return action;
         });
+    }
+    // A working device and, listed beside it, one that accepts connections but never answers
+    // (a stopped simulator, as id hung); null if they do not start.
+    SimulatorProcess* startHungBesideGood(const QString& id = "hung")
+    {
+        SimulatorProcess* hung = startSimulator("handset", id);
+        if (!hung || !startSimulator("simulator", "good"))
+            return nullptr;
+        m_delvix = std::make_unique<Delvix>();
+        if (!QTest::qWaitFor([this, &id] { return entry("good") && entry(id); }))
+            return nullptr;
+        hung->pause();
+        return hung;
     }
     static QList<DeviceWindow*> deviceWindows()
     {
@@ -94,6 +116,8 @@ private slots:
         QApplication::setOrganizationName("Norvale");
         QApplication::setApplicationName("Delvix");
         QTRY_VERIFY2_WITH_TIMEOUT(QSystemTrayIcon::isSystemTrayAvailable(), "no tray host on this display", 10000);
+        // Listed devices are probed; a stale socket is left out.
+        QVERIFY(TestSupport::makeStaleSocket(m_sockets.filePath("stale.sock")));
         qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_sockets.path()));
         Portlex::Initialize();
     }
@@ -207,6 +231,55 @@ private slots:
             QVERIFY(!window);
         if (windows > 0)
             QCOMPARE(QSettings().value("Zantro USB Device: Kestrel K7/size").toSize(), QSize(860, 700));
+    }
+
+    // The hung device's connect runs beside the GUI: a working device connects and opens its
+    // window meanwhile, and the busy cursor stays until the hung one times out. The menu's
+    // probe, on a thread of its own, keeps listing the hung device until then.
+    void hungDeviceNeverHoldsUpTheTray()
+    {
+        QVERIFY(startHungBesideGood());
+        QAction* hung = entry("hung");
+        QVERIFY(hung);
+        hung->trigger();
+        QVERIFY(QGuiApplication::overrideCursor());
+        QCOMPARE(QGuiApplication::overrideCursor()->shape(), Qt::BusyCursor);
+        QVERIFY(choose("good"));
+        QTRY_COMPARE(deviceWindows().size(), 1);
+        QVERIFY2(QGuiApplication::overrideCursor(), "the hung device's connect is still under way");
+
+        QTRY_VERIFY_WITH_TIMEOUT(!balloon().isEmpty(), 2 * Protocol::CallTimeoutMs);
+        QCOMPARE(balloon().value(0), QString("Connect Failed"));
+        QVERIFY2(balloon().value(1).startsWith(QString("Failure Code: (%1) ").arg(PortlexError::Timeout)),
+                 qPrintable(balloon().value(1)));
+        QVERIFY(!QGuiApplication::overrideCursor());
+        QCOMPARE(deviceWindows().size(), 1);
+        QTRY_VERIFY(!entry("hung") && entry("good"));
+    }
+
+    // A connect that ends after Exit opens nothing; a program that ends meanwhile waits for it
+    // and gives back the busy cursor. The hung device (a new one each time: a connected device
+    // is not connected again) answers once Exit was chosen.
+    void exitDuringAConnect_data()
+    {
+        QTest::addColumn<bool>("programEnds");
+        QTest::newRow("event loop goes on") << false;
+        QTest::newRow("program ends") << true;
+    }
+    void exitDuringAConnect()
+    {
+        QFETCH(bool, programEnds);
+        const QString id = programEnds ? "hung-ends" : "hung-goes-on";
+        SimulatorProcess* hung = startHungBesideGood(id);
+        QVERIFY(hung && entry(id));
+        entry(id)->trigger();
+        QVERIFY(QGuiApplication::overrideCursor());
+        m_delvix->_actionExit->trigger();
+        hung->resume();
+        if (programEnds)
+            m_delvix.reset();
+        QTRY_VERIFY(!QGuiApplication::overrideCursor());
+        QVERIFY(deviceWindows().isEmpty() && balloon().isEmpty());
     }
 };
 

@@ -1,15 +1,59 @@
+#include "AboutDialog.h"
 #include "EnsureWindowPlacementOnDesktop.h"
 #include "FreeFormProgressDialog.h"
+#include "SaveXmlReport.h"
+#include "SplashDialog.h"
+#include "TestSupport.h"
 
+#include <QAbstractEventDispatcher>
 #include <QApplication>
-#include <QDir>
+#include <QDirIterator>
+#include <QImage>
+#include <QPointer>
+#include <QSettings>
+#include <QTemporaryDir>
 #include <QTest>
 
+// The application's helpers: window placement, the progress callback, the pictures, the
+// splash and About dialogs, and the one routine that writes XML exports (what it asks,
+// where it starts, what it writes, and what it says when it cannot write).
 class TestWindowHelpers : public QObject
 {
     Q_OBJECT
 
+    QTemporaryDir m_dir;
+    QList<QStringList> m_questions;  // caption, folder, filter
+    QStringList m_warnings;
+
+    // Answers the file dialog with answer and records what was asked.
+    void answerWith(const QString& answer)
+    {
+        saveXmlReportDialogs().askFileName = [this, answer](QWidget*, const QString& caption, const QString& folder,
+                                                            const QString& filter) {
+            m_questions.append({caption, folder, filter});
+            return answer;
+        };
+    }
+
 private slots:
+    void initTestCase()
+    {
+        Q_INIT_RESOURCE(delvix);
+        QCoreApplication::setOrganizationName("Norvale");
+        QCoreApplication::setApplicationName("Delvix");
+        QVERIFY(m_dir.isValid());
+    }
+    void init()
+    {
+        QSettings().clear();
+        m_questions.clear();
+        m_warnings.clear();
+        saveXmlReportDialogs().warn = [this](QWidget*, const QString& title, const QString& text) {
+            m_warnings << title + "|" + text;
+        };
+    }
+    void cleanup() { saveXmlReportDialogs() = SaveXmlReportDialogs(); }
+
     void progressCallbackSequence()
     {
         FreeFormProgressDialog dialog;
@@ -59,6 +103,98 @@ private slots:
         window.setGeometry(stored);
         EnsureWindowPlacementOnDesktop(&window);
         QCOMPARE(window.pos(), expected);
+    }
+
+    // A picture that does not load shows as a blank icon.
+    void everyResourceLoads()
+    {
+        QStringList loaded;
+        for (const char* folder : {":/Resources", ":/LockStatusWidget"}) {
+            for (QDirIterator it(folder, QDir::Files, QDirIterator::Subdirectories); it.hasNext();) {
+                loaded << it.next();
+                QVERIFY2(!QImage(loaded.last()).isNull(), qPrintable(loaded.last()));
+            }
+        }
+        for (const char* named : {":/Resources/splash.png", ":/Resources/about.png", ":/Resources/InfoCursor.png"})
+            QVERIFY2(loaded.contains(named), named);
+        QVERIFY(!QImage("://Resources/Delvix.png").isNull());  // as the forms name it
+        QCOMPARE(QImage(":/Resources/TrayIcon.png").size(), QSize(16, 16));
+    }
+
+    void splashClosesOnlyOnItsOwnCappedTimer()
+    {
+        QPointer<SplashDialog> splash = new SplashDialog(":/Resources/splash.png", "notice", "0.5.1.0");
+        splash->show();
+        splash->startCloseTimer(10 * SplashDialog::LongestShowing);
+        const auto timers = QAbstractEventDispatcher::instance()->registeredTimers(splash);
+        QCOMPARE(timers.size(), 1);
+        QCOMPARE(timers.first().interval, SplashDialog::LongestShowing);
+
+        QTimerEvent foreign(timers.first().timerId + 1000);
+        QCoreApplication::sendEvent(splash, &foreign);
+        QCoreApplication::sendPostedEvents(nullptr, QEvent::DeferredDelete);
+        QVERIFY(splash && splash->isVisible());
+        QTimerEvent own(timers.first().timerId);
+        QCoreApplication::sendEvent(splash, &own);
+        QVERIFY(splash && !splash->isVisible());
+        QVERIFY(QAbstractEventDispatcher::instance()->registeredTimers(splash).isEmpty());
+        QCoreApplication::sendPostedEvents(nullptr, QEvent::DeferredDelete);
+        QVERIFY(!splash);
+    }
+
+    void aboutClosesOnMouseRelease()
+    {
+        AboutDialog about(":/Resources/about.png", "notice", "0.5.1.0");
+        about.show();
+        QVERIFY(QTest::qWaitForWindowExposed(&about));
+        QTest::mouseRelease(&about, Qt::RightButton, Qt::NoModifier, QPoint(420, 40));
+        QVERIFY(!about.isVisible());
+        QCOMPARE(about.result(), int(QDialog::Accepted));
+    }
+
+    void asksWithCaptionFilterAndLastFolder()
+    {
+        QVERIFY(QDir().mkpath(m_dir.filePath("first")));
+        answerWith(m_dir.filePath("first/modules.xml"));
+        saveXmlReport(nullptr, "ModuleList", "<zant-modules/>\n");
+        QCOMPARE(m_questions, QList<QStringList>({{"Save fileModuleList", QCoreApplication::applicationDirPath(), "XML Files (*.xml)"}}));
+
+        // Every export starts where the last one, of any page or tool, was saved.
+        answerWith(m_dir.filePath("classes.xml"));
+        saveXmlReport(nullptr, "ClassList", "<zant-class-ids/>\n");
+        QCOMPARE(m_questions.last().mid(0, 2), QStringList({"Save fileClassList", m_dir.filePath("first")}));
+        QCOMPARE(QSettings().value("lastPath").toString(), m_dir.path());
+        QVERIFY(m_warnings.isEmpty());
+    }
+
+    void writesTheReportUnchanged()
+    {
+        const QString target = m_dir.filePath("report.xml");
+        QVERIFY(TestSupport::writeFile(target, QByteArray(4096, 'x')));
+        const QString report = QString::fromUtf8("<!DOCTYPE zant-modules>\n<zant-modules>\n <module name=\"Größe\"/>\n</zant-modules>\n");
+        answerWith(target);
+        saveXmlReport(nullptr, "ModuleList", report);
+        QCOMPARE(TestSupport::readFile(target), report.toUtf8());
+    }
+
+    // Neither a cancelled dialog nor a failed write moves the start folder; only the failure warns.
+    void cancelAndFailureKeepTheLastFolder()
+    {
+        QVERIFY(TestSupport::writeFile(m_dir.filePath("plain.txt"), "kept"));
+        QSettings().setValue("lastPath", m_dir.filePath("first"));
+        answerWith(QString());
+        saveXmlReport(nullptr, "ModuleList", "<zant-modules/>");
+        QCOMPARE(m_questions.size(), 1);
+        QVERIFY(m_warnings.isEmpty());
+
+        const QString path = m_dir.filePath("plain.txt/report.xml");
+        answerWith(path);
+        saveXmlReport(nullptr, "ModuleList", "<zant-modules/>");
+        QCOMPARE(m_warnings.size(), 1);
+        QVERIFY2(m_warnings[0].startsWith("Export to XML|") && m_warnings[0].contains(QDir::toNativeSeparators(path)),
+                 qPrintable(m_warnings[0]));
+        QCOMPARE(TestSupport::readFile(m_dir.filePath("plain.txt")), QByteArray("kept"));
+        QCOMPARE(QSettings().value("lastPath").toString(), m_dir.filePath("first"));
     }
 };
 

@@ -3,7 +3,11 @@
 // Records, waits and readers shared by the page tests.
 
 #include "DeviceCache.h"
+#include "SimulatorProcess.h"
+#include "TestSupport.h"
 
+#include <QDir>
+#include <QProcess>
 #include <QTableWidget>
 #include <QTest>
 #include <QTreeWidget>
@@ -24,6 +28,22 @@ inline DeviceCache cacheOf(const QList<IdRecord>& classes)
     cache.deviceData.targetId = QStringLiteral("0x0A110021");
     cache.deviceData.hardware.insert(QStringLiteral("Manufacturer"), QStringLiteral("Zantro & Sons"));
     return cache;
+}
+
+// A simulator image of device id: body inside <device>, one 16 MiB flash volume with the further
+// attributes volume, and the modules (make-sample entries) that zantro-sim builds on it.
+inline bool writeImage(const QString& folder, const QByteArray& id, const QByteArray& volume,
+                       const QByteArray& body = QByteArray(), const QByteArray& modules = QByteArray())
+{
+    const QDir image(folder);
+    return image.mkpath("flash/usermod")
+        && TestSupport::writeFile(image.filePath("device.xml"),
+                                  "<device id=\"" + id + "\" name=\"" + id + "\" connection=\"simulator\">\n <identity phoneName=\""
+                                      + id + "\" targetId=\"0x0A1100FD\" zantVersion=\"3.2.9\"/>\n" + body
+                                      + " <volume id=\"1\" name=\"Flash\" mount=\"/\" folder=\"flash\" size=\"16777216\"" + volume
+                                      + "/>\n</device>\n")
+        && TestSupport::writeFile(image.filePath("modules.xml"), "<sample>\n" + modules + "</sample>\n")
+        && QProcess::execute(SimulatorProcess::executable(), {"make-sample", image.filePath("modules.xml"), folder}) == 0;
 }
 
 // The tree as lines: one per item, depth-first, indented by depth, columns joined by "|".
@@ -49,6 +69,20 @@ inline QStringList columnTexts(const QTableWidget* table, int column)
     for (int row = 0; row < table->rowCount(); ++row)
         texts.append(table->item(row, column) ? table->item(row, column)->text() : QStringLiteral("<none>"));
     return texts;
+}
+
+// True when report is the text of expected/<name>; otherwise it is left as actual-<name> in the
+// temporary folder, for a look.
+inline bool isExpectedExport(const QString& report, const QString& name)
+{
+    QFile expected(QFINDTESTDATA("expected/" + name));
+    if (expected.open(QIODevice::ReadOnly) && report == QString::fromUtf8(expected.readAll()))
+        return true;
+    QFile actual(QDir::temp().filePath("actual-" + name));
+    if (actual.open(QIODevice::WriteOnly))
+        actual.write(report.toUtf8());
+    qWarning("the export differs from expected/%s; it is in %s", qPrintable(name), qPrintable(actual.fileName()));
+    return false;
 }
 
 // The first argument of every emission a QSignalSpy recorded, as text.

@@ -5,10 +5,8 @@
 #include "PageFixtures.h"
 #include "Portlex.h"
 #include "SimulatorProcess.h"
-#include "TestSupport.h"
 
 #include <QLineEdit>
-#include <QProcess>
 #include <QTemporaryDir>
 
 using namespace PageFixtures;
@@ -21,39 +19,29 @@ QByteArray node(const QByteArray& name, const QByteArray& children = QByteArray(
     return "<node name=\"" + name + "\"><value name=\"of\" text=\"" + name + "\"/>" + children + "</node>\n";
 }
 
-// Leaf nodes prefix + first, ..., prefix + last, numbered in two digits.
-QByteArray numbered(const QByteArray& prefix, int first, int last)
+// prefix + first, ..., prefix + last, numbered in two digits.
+QStringList numbered(const QString& prefix, int first, int last)
+{
+    QStringList names;
+    for (int n = first; n <= last; ++n)
+        names << prefix + QString::number(n).rightJustified(2, '0');
+    return names;
+}
+
+QByteArray leaves(const QStringList& names)
 {
     QByteArray nodes;
-    for (int n = first; n <= last; ++n)
-        nodes += node(prefix + QByteArray::number(n).rightJustified(2, '0'));
+    for (const QString& name : names)
+        nodes += node(name.toUtf8());
     return nodes;
 }
 
-bool writeImage(const QString& folder)
-{
-    const QByteArray settings = "<settings><value name=\"root\" text=\"yes\"/>\n"
+const QByteArray Settings = "<settings><value name=\"root\" text=\"yes\"/>\n"
         + node("appinfo", "<value name=\"count\" text=\"34\"/><value name=\"Build\" text=\"b7\"/>" + node("a1") + node("a2") + node("a3"))
         + node("ztoversion", node("c")) + node("OATtest", node("t1") + node("t2"))
         + node("CSA_NORMAL", node("hidden1")) + node("csa_removal", node("hidden2"))
-        + node("Zeta", numbered("z", 1, 11)) + node("alpha", node("a01", node("sub")) + numbered("a", 2, 10))
+        + node("Zeta", leaves(numbered("z", 1, 11))) + node("alpha", node("a01", node("sub")) + leaves(numbered("a", 2, 10)))
         + "</settings>\n";
-    return QDir(folder).mkpath("flash")
-        && TestSupport::writeFile(QDir(folder).filePath("device.xml"),
-                                  "<device id=\"settings\" name=\"Settings\" connection=\"simulator\">\n"
-                                  " <identity phoneName=\"Settings\" targetId=\"0x0A1100FD\" zantVersion=\"3.2.9\"/>\n"
-                                  + settings
-                                  + " <volume id=\"1\" name=\"Flash\" mount=\"/\" folder=\"flash\" size=\"16777216\"/>\n"
-                                    "</device>\n");
-}
-
-QStringList numberedPaths(const QString& prefix, int first, int last)
-{
-    QStringList paths;
-    for (int n = first; n <= last; ++n)
-        paths << prefix + QString::number(n).rightJustified(2, '0');
-    return paths;
-}
 
 // The order the crawl reads the test store in: "appinfo" and "ztoversion" branches first,
 // the other children of the root at 10 in plain string order, then the children of nodes
@@ -63,7 +51,7 @@ QStringList crawlOrder()
 {
     return QStringList{"/", "/appinfo", "/appinfo/a1", "/appinfo/a2", "/appinfo/a3", "/ztoversion", "/ztoversion/c",
                        "/Zeta", "/alpha", "/alpha/a01", "/alpha/a01/sub"}
-        + numberedPaths("/alpha/a", 2, 10) + numberedPaths("/Zeta/z", 1, 11)
+        + numbered("/alpha/a", 2, 10) + numbered("/Zeta/z", 1, 11)
         + QStringList{"/OATtest", "/OATtest/t1", "/OATtest/t2"};
 }
 
@@ -120,7 +108,7 @@ private slots:
     {
         qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_sockets.path()));
         QVERIFY(Portlex::Initialize());
-        QVERIFY(writeImage(m_image.path()));
+        QVERIFY(writeImage(m_image.path(), "settings", {}, Settings));
         QVERIFY(m_simulator.connectDevice(m_image.path(), "settings"));
     }
 
@@ -230,28 +218,6 @@ private slots:
         QVERIFY(!page.pacer().isArmed());
         page.startComponent("settings");
         QVERIFY(tickUntil(page, [&page] { return page.state() == GatewayComponentWidget::Complete; }));
-    }
-
-    // A generated store is crawled whole, apart from what lies below "CSA_REMOVAL".
-    void generatedStore()
-    {
-        QTemporaryDir image;
-        QCOMPARE(QProcess::execute(SimulatorProcess::executable(),
-                                   {"generate", image.path(), "--modules", "0", "--classes", "0", "--files", "0",
-                                    "--processes", "0", "--settings", "405"}),
-                 0);
-        SimulatorProcess generated(m_sockets.path());
-        QVERIFY(generated.connectDevice(image.path(), "generated", {}, SimulatorProcess::Image::InPlace));
-        ISettingsTreeView page;
-        page.startComponent("generated");
-        QVERIFY(tickUntil(page, [&page] { return page.state() == GatewayComponentWidget::Complete; }));
-        int nodes = 0;
-        for (QTreeWidgetItemIterator it(page._settingsTree); *it; ++it)
-            nodes += kindOf(*it) == ISettingsTreeView::ValueKind ? 0 : 1;
-        // 400 generated nodes, 4 of them below "CSA_REMOVAL".
-        QCOMPARE(nodes, 405 - 4);
-        QCOMPARE(itemAt(page._settingsTree, "/CSA_REMOVAL")->childCount(), 0);
-        QVERIFY(itemAt(page._settingsTree, "/oattest")->childCount() > 0);
     }
 
     // In a device window the completed page may be searched but has nothing to export.

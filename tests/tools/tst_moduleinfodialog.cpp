@@ -120,6 +120,15 @@ QList<ModuleInfoDialog*> openDialogs()
     return dialogs;
 }
 
+// The only dialog open, if it is shown on its own, not modal and with a size grip.
+ModuleInfoDialog* theOpenDialog()
+{
+    const QList<ModuleInfoDialog*> dialogs = openDialogs();
+    ModuleInfoDialog* dialog = dialogs.size() == 1 ? dialogs.first() : nullptr;
+    return dialog && dialog->isVisible() && !dialog->isModal() && !dialog->parent() && dialog->isSizeGripEnabled()
+        ? dialog : nullptr;
+}
+
 // A MIF container without the module header resource.
 QByteArray containerWithoutModule()
 {
@@ -188,37 +197,23 @@ private slots:
         qDeleteAll(openDialogs());
     }
 
-    // The same module given as an entry, read from a MIF file on disk, or asked of the device,
-    // replacing every row of an entry shown before.
-    void showsTheModule_data()
-    {
-        QTest::addColumn<QString>("source");
-        QTest::addColumn<QString>("title");
-        QTest::newRow("entry") << "entry" << "Module Info";
-        QTest::newRow("MIF file on disk") << "file" << "Module Info odd";
-        QTest::newRow("device module") << "device" << "Module Info odd";
-    }
+    // The same module given as an entry or read from a MIF file on disk (asked of the device:
+    // moduleListDoubleClickOpensTheModule), replacing every row of an entry shown before.
     void showsTheModule()
     {
-        QFETCH(QString, source);
-        QFETCH(QString, title);
-        ModuleInfoDialog dialog;
         MifEntry before;
         before.classes = {Stranger, OtherStranger};
-        QVERIFY(dialog._moduleInfoView->setMifEntry(before));
-        if (source == "entry") {
-            QVERIFY(dialog._moduleInfoView->setMifEntry(oddModule()));
-        } else if (source == "file") {
-            dialog.openMifFile(m_files.filePath("odd.mif"), "odd");
-        } else {
-            ModuleInfo module;
-            module.name = "odd";
-            module.path = OddModulePath;
-            dialog.openDeviceModule(DeviceId, module);
+        for (const bool fromFile : {false, true}) {
+            ModuleInfoDialog dialog;
+            QVERIFY(dialog._moduleInfoView->setMifEntry(before));
+            if (fromFile)
+                dialog.openMifFile(m_files.filePath("odd.mif"), "odd");
+            else
+                QVERIFY(dialog._moduleInfoView->setMifEntry(oddModule()));
+            QCOMPARE(dialog.windowTitle(), fromFile ? QString("Module Info odd") : QString("Module Info"));
+            QCOMPARE(viewLines(dialog._moduleInfoView), OddModuleLines);
+            QCOMPARE(dialog._moduleInfoView->mifEntryXml(), OddModuleXml);
         }
-        QCOMPARE(dialog.windowTitle(), title);
-        QCOMPARE(viewLines(dialog._moduleInfoView), OddModuleLines);
-        QCOMPARE(dialog._moduleInfoView->mifEntryXml(), OddModuleXml);
     }
 
     // Nothing to show leaves the view empty, without a message; the title still names the
@@ -264,10 +259,9 @@ private slots:
         QTest::addColumn<MifEntry>("entry");
         QTest::addColumn<QStringList>("sections");
         const MifEntry full = oddModule();
-        MifEntry none;
-        none.classCount = 3;
-        none.mimeTypeCount = 2;
-        MifEntry ends = none, middle = none;
+        MifEntry none, ends, middle;
+        none.classCount = ends.classCount = middle.classCount = 3;
+        none.mimeTypeCount = ends.mimeTypeCount = middle.mimeTypeCount = 2;
         ends.classes = full.classes;
         ends.mimeTypes = full.mimeTypes;
         middle.applets = full.applets;
@@ -315,60 +309,39 @@ private slots:
         QVERIFY(dialog.isVisible());
     }
 
-    // Each dialog opens 20 pixels right and down from where the last one closed, and stays on a screen.
+    // The first dialog opens at its default place; however one is closed, it goes and leaves its
+    // place to the next one, 20 pixels right and down, unless that is off every screen.
     void placement_data()
     {
-        QTest::addColumn<QVariant>("storedPos");
-        QTest::addColumn<QVariant>("storedSize");
-        QTest::addColumn<QPoint>("pos");
-        QTest::addColumn<QSize>("size");
-        QTest::newRow("first ever") << QVariant() << QVariant() << QPoint(120, 120) << QSize(600, 350);
-        QTest::newRow("stored") << QVariant(QPoint(300, 200)) << QVariant(QSize(500, 300)) << QPoint(320, 220)
-                                << QSize(500, 300);
-        QTest::newRow("off every screen") << QVariant(QPoint(9000, 9000)) << QVariant(QSize(500, 300)) << QPoint(40, 40)
-                                          << QSize(500, 300);
+        QTest::addColumn<QString>("close");
+        QTest::addColumn<QPoint>("closedAt");
+        QTest::addColumn<QRect>("next");
+        QTest::newRow("first ever") << "" << QPoint() << QRect(120, 120, 600, 350);
+        QTest::newRow("Close") << "Close" << QPoint(200, 150) << QRect(220, 170, 520, 310);
+        QTest::newRow("Escape") << "Escape" << QPoint(200, 150) << QRect(220, 170, 520, 310);
+        QTest::newRow("window closed") << "window" << QPoint(200, 150) << QRect(220, 170, 520, 310);
+        QTest::newRow("off every screen") << "window" << QPoint(9000, 9000) << QRect(40, 40, 520, 310);
     }
     void placement()
     {
-        QFETCH(QVariant, storedPos);
-        QFETCH(QVariant, storedSize);
-        QFETCH(QPoint, pos);
-        QFETCH(QSize, size);
-        if (storedPos.isValid()) {
-            QSettings settings;
-            settings.setValue("ModuleInfoDialog/pos", storedPos);
-            settings.setValue("ModuleInfoDialog/size", storedSize);
+        QFETCH(QString, close);
+        QFETCH(QPoint, closedAt);
+        QFETCH(QRect, next);
+        if (!close.isEmpty()) {
+            QPointer<ModuleInfoDialog> first = new ModuleInfoDialog;
+            first->show();
+            first->move(closedAt);
+            first->resize(520, 310);
+            if (close == "Close")
+                first->okButton->click();
+            else if (close == "Escape")
+                QTest::keyClick(first, Qt::Key_Escape);
+            else
+                first->close();
+            QTRY_VERIFY(first.isNull());
         }
         ModuleInfoDialog dialog;
-        QCOMPARE(dialog.pos(), pos);
-        QCOMPARE(dialog.size(), size);
-    }
-
-    // However it is closed, a dialog goes and leaves its place to the next one.
-    void cascadesFromTheLastClosed_data()
-    {
-        QTest::addColumn<QString>("how");
-        QTest::newRow("Close") << "Close";
-        QTest::newRow("Escape") << "Escape";
-        QTest::newRow("window closed") << "window";
-    }
-    void cascadesFromTheLastClosed()
-    {
-        QFETCH(QString, how);
-        QPointer<ModuleInfoDialog> first = new ModuleInfoDialog;
-        first->show();
-        first->move(200, 150);
-        first->resize(520, 310);
-        if (how == "Close")
-            first->okButton->click();
-        else if (how == "Escape")
-            QTest::keyClick(first, Qt::Key_Escape);
-        else
-            first->close();
-        QTRY_VERIFY(first.isNull());
-        ModuleInfoDialog second;
-        QCOMPARE(second.pos(), QPoint(220, 170));
-        QCOMPARE(second.size(), QSize(520, 310));
+        QCOMPARE(QRect(dialog.pos(), dialog.size()), next);
     }
 
     // A double-click in the device window's module list opens the module's own information.
@@ -386,29 +359,31 @@ private slots:
         const QPoint centre = table->visualItemRect(found.first()).center();
         QTest::mouseDClick(window->windowHandle(), Qt::LeftButton, {}, table->viewport()->mapTo(window, centre));
 
-        const QList<ModuleInfoDialog*> dialogs = openDialogs();
-        QCOMPARE(dialogs.size(), 1);
-        ModuleInfoDialog* dialog = dialogs.first();
-        QVERIFY(dialog->isVisible() && !dialog->isModal() && !dialog->parent() && dialog->isSizeGripEnabled());
+        ModuleInfoDialog* dialog = theOpenDialog();
+        QVERIFY(dialog);
         QCOMPARE(dialog->windowTitle(), QString("Module Info odd"));
         QCOMPARE(viewLines(dialog->_moduleInfoView), OddModuleLines);
     }
 
-    // A device file whose complete suffix is "mif", in any case, opens as module information
-    // from its copy on the PC; any other goes to the desktop.
-    void deviceFileOpensAsModuleInfo_data()
+    // A device file opens from its copy in the temporary folder: one whose complete suffix is
+    // "mif", in any case, as module information, any other on the desktop. A name that would
+    // land outside that folder, or a file the device lacks, opens nothing.
+    void deviceFileOpensOnThePC_data()
     {
         QTest::addColumn<QString>("name");
-        QTest::addColumn<QString>("title");
+        QTest::addColumn<QString>("opens");  // a dialog's title, "desktop", or empty for nothing
         QTest::newRow("mif") << "copy.mif" << "Module Info copy";
         QTest::newRow("MIF") << "UPPER.MIF" << "Module Info UPPER";
-        QTest::newRow("further suffix") << "copy.mif.bak" << "";
-        QTest::newRow("two suffixes") << "archive.old.mif" << "";
+        QTest::newRow("further suffix") << "copy.mif.bak" << "desktop";
+        QTest::newRow("two suffixes") << "archive.old.mif" << "desktop";
+        QTest::newRow("missing file") << "none.txt" << "";
+        QTest::newRow("parent folder") << ".." << "";
+        QTest::newRow("folder") << "" << "";
     }
-    void deviceFileOpensAsModuleInfo()
+    void deviceFileOpensOnThePC()
     {
         QFETCH(QString, name);
-        QFETCH(QString, title);
+        QFETCH(QString, opens);
         QTemporaryDir temporary;
         const QByteArray previous = qgetenv("TMPDIR");
         qputenv("TMPDIR", QFile::encodeName(temporary.path()));
@@ -419,18 +394,16 @@ private slots:
         qputenv("TMPDIR", previous);
 
         const QString local = temporary.filePath(name);
-        QCOMPARE(TestSupport::readFile(local), MifWriter::moduleData(oddModule()));
-        const QList<ModuleInfoDialog*> dialogs = openDialogs();
-        if (title.isEmpty()) {
-            QCOMPARE(dialogs.size(), 0);
-            QCOMPARE(desktop.opened, QList<QUrl>({QUrl::fromLocalFile(local)}));
+        QCOMPARE(TestSupport::treeEntries(temporary.path()), opens.isEmpty() ? QStringList() : QStringList(name));
+        QCOMPARE(desktop.opened, opens == "desktop" ? QList<QUrl>({QUrl::fromLocalFile(local)}) : QList<QUrl>());
+        if (!opens.startsWith("Module")) {
+            QCOMPARE(openDialogs().size(), 0);
             return;
         }
-        QCOMPARE(desktop.opened, QList<QUrl>());
-        QCOMPARE(dialogs.size(), 1);
-        QVERIFY(dialogs.first()->isVisible() && !dialogs.first()->parent() && dialogs.first()->isSizeGripEnabled());
-        QCOMPARE(dialogs.first()->windowTitle(), title);
-        QCOMPARE(viewLines(dialogs.first()->_moduleInfoView), OddModuleLines);
+        QCOMPARE(TestSupport::readFile(local), MifWriter::moduleData(oddModule()));
+        QVERIFY(theOpenDialog());
+        QCOMPARE(theOpenDialog()->windowTitle(), opens);
+        QCOMPARE(viewLines(theOpenDialog()->_moduleInfoView), OddModuleLines);
     }
 };
 

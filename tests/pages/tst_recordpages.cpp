@@ -1,0 +1,317 @@
+#include "FamilyTreeView.h"
+#include "FormatSize.h"
+#include "LevelFiles.h"
+#include "LevelViewWidget.h"
+#include "PageFixtures.h"
+#include "PhoneInfoWidget.h"
+#include "TestSupport.h"
+
+#include <QFileInfo>
+#include <QLabel>
+#include <QSignalSpy>
+#include <QTemporaryDir>
+
+using namespace PageFixtures;
+
+namespace {
+
+// classes, then enough unavailable ones to keep the worker, and so the fill, going.
+DeviceCache busyDevice(QList<IdRecord> classes)
+{
+    for (int i = 0x100; i < 0x1500; ++i)
+        classes.append(makeClass(QString("0x%1").arg(i, 8, 16, QChar('0')), "Off", "F", "S", false));
+    return cacheOf(classes);
+}
+
+// Classes of a small device: two families, one class unavailable.
+DeviceCache smallDevice()
+{
+    return cacheOf({makeClass("0x01000001", "Player", "Media", "Audio"), makeClass("0x01000002", "Camera", "media", "Video"),
+                    makeClass("0x01000003", "Mixer", "Media", "audio", false), makeClass("0x0100000A", "Heap", "Kernel", "Memory")});
+}
+
+// Adds path as a choice and chooses it, as the user does from the combo box.
+void choose(LevelViewWidget& page, const QString& path)
+{
+    page._levelDocuments->addItem(QFileInfo(path).baseName(), path);
+    page._levelDocuments->setCurrentIndex(page._levelDocuments->count() - 1);
+}
+
+} // namespace
+
+// The pages filled from the device's record alone: the family tree (grouping of the available
+// classes, the order of the families while the tree fills, the export), the level page (its
+// choice of level files, the check of a definition against the classes, its failures and
+// export) and the phone information (every label and box from its key, the format tables,
+// the size texts).
+class TestRecordPages : public QObject
+{
+    Q_OBJECT
+
+private slots:
+    void initTestCase()
+    {
+        m_small = m_folder.filePath("small.xml");
+        QVERIFY(TestSupport::writeFile(m_small, R"(<level name="small">
+  <Id value="0x01000002" name="Camera"/>
+  <Id value="0x01000001" name="Player"/>
+  <Id value="0x01000003" name="Mixer"/>
+  <Id value="0x0100000a" name="FromFile"/>
+  <Id value="0x01000099" name="Missing"/>
+  <Id value="0x01000098" name="AlsoMissing"/>
+</level>
+)"));
+    }
+
+    // Families sorted without regard to case and named as first met; sub-families keep
+    // their case; the rest in the order the classes came (ascending ids).
+    void groupsByFamilyAndSubFamily()
+    {
+        DeviceCache cache = cacheOf({
+            makeClass("0x00000001", "Player", "Media", "Audio"),
+            makeClass("0x00000002", "Camera", "media", "Video"),
+            makeClass("0x00000003", "Mixer", "MEDIA", "audio"),
+            makeClass("0x00000004", "Tuner", "Media", "Audio"),
+            makeClass("0x00000005", "", "", ""),
+            makeClass("0x00000006", "Hidden", "Media", "Audio", false),
+            makeClass("0x00000007", "Clock", "zeta", "Time"),
+            makeClass("0x00000008", "Heap", "alpha", "Memory"),
+            makeClass("0x00000009", "Ghost", "Phantom", "Spooky", false),
+        });
+        FamilyTreeView page;
+        QSignalSpy states(&page, &GatewayComponentWidget::stateChanged);
+        page.setDeviceRecord(&cache);
+        // Left to its own timer.
+        QTRY_VERIFY_WITH_TIMEOUT(page.isComplete(), 30000);
+        QCOMPARE(treeLines(page._familyTree),
+                 QStringList({"alpha|||", " |Memory||", "  ||Heap|0x00000008", "Media|||", " |Audio||", "  ||Player|0x00000001",
+                              "  ||Tuner|0x00000004", " |Video||", "  ||Camera|0x00000002", " |audio||", "  ||Mixer|0x00000003",
+                              "unknown|||", " |unknown||", "  ||unknown|0x00000005", "zeta|||", " |Time||", "  ||Clock|0x00000007"}));
+        QCOMPARE(signalTexts(states), QStringList({"Processing", "Complete"}));
+        QVERIFY(page._familyTree->isSortingEnabled());
+    }
+
+    void readyWithoutAvailableClasses()
+    {
+        for (DeviceCache cache : {cacheOf({}), cacheOf({makeClass("0x00000001", "A", "F", "S", false)})}) {
+            FamilyTreeView page;
+            page.setDeviceRecord(&cache);
+            QVERIFY(fillByHand(page));
+            QCOMPARE(page._familyTree->topLevelItemCount(), 0);
+        }
+    }
+
+    // The fill puts each new family in its place: the tree is in order at every moment.
+    void familiesStayInOrderWhileFilling()
+    {
+        DeviceCache cache = busyDevice({makeClass("0x00000001", "Z", "zeta", "S"), makeClass("0x00000002", "A", "Alpha", "S"),
+                                        makeClass("0x00000003", "M", "media", "S"), makeClass("0x00000004", "B", "Beta", "S"),
+                                        makeClass("0x00000005", "M2", "Media", "T")});
+        FamilyTreeView page;
+        page.setDeviceRecord(&cache);
+        QStringList families;
+        QVERIFY(tickUntil(page, [&] {
+            families.clear();
+            for (int i = 0; i < page._familyTree->topLevelItemCount(); ++i)
+                families.append(page._familyTree->topLevelItem(i)->text(0));
+            return families.size() == 4 && page._familyTree->topLevelItem(2)->childCount() == 2;
+        }));
+        QCOMPARE(families, QStringList({"Alpha", "Beta", "media", "zeta"}));
+        QCOMPARE(page.state(), GatewayComponentWidget::Processing);
+    }
+
+    // The export follows the tree as the user sorted it, frozen at the first call; without
+    // a record it keeps its shape.
+    void exportFollowsTheTreeAndIsFrozen()
+    {
+        FamilyTreeView empty;
+        QCOMPARE(empty.xmlReport(), QString("<!DOCTYPE familyTree>\n<deviceTree device=\"\" manufacturer=\"\"/>\n"));
+        DeviceCache cache = cacheOf({makeClass("0x00000001", "beta", "Media", "Audio"),
+                                     makeClass("0x00000002", "Alpha", "Media", "Audio"),
+                                     makeClass("0x00000003", "Heap", "Kernel", "Memory")});
+        FamilyTreeView page;
+        page.setDeviceRecord(&cache);
+        QVERIFY(fillByHand(page));
+        page._familyTree->sortByColumn(2, Qt::DescendingOrder);
+        const QString expected = "<!DOCTYPE familyTree>\n"
+                                 "<deviceTree device=\"0x0A110021\" manufacturer=\"Zantro &amp; Sons\">\n"
+                                 " <family name=\"Kernel\">\n  <subfamily name=\"Memory\">\n"
+                                 "   <class name=\"Heap\" classid=\"0x00000003\"/>\n"
+                                 "  </subfamily>\n </family>\n <family name=\"Media\">\n  <subfamily name=\"Audio\">\n"
+                                 "   <class name=\"beta\" classid=\"0x00000001\"/>\n"
+                                 "   <class name=\"Alpha\" classid=\"0x00000002\"/>\n"
+                                 "  </subfamily>\n </family>\n</deviceTree>\n";
+        QCOMPARE(page.xmlReport(), expected);
+        page._familyTree->sortByColumn(2, Qt::AscendingOrder);
+        delete page._familyTree->topLevelItem(0);
+        QCOMPARE(page.xmlReport(), expected);
+    }
+
+    // Sorted by name whatever order the folder lists them in, letter case aside; without a
+    // folder, the levels beside the program. Offering is not choosing.
+    void offersTheLevelFiles()
+    {
+        QTemporaryDir levels;
+        for (const char* name : {"b-level.xml", "C.xml.bak", "a-level.xml", "Alpha.xml", "notes.txt"})
+            QVERIFY(TestSupport::writeFile(levels.filePath(name), "<level/>"));
+        DeviceCache cache = smallDevice();
+        LevelViewWidget page, shipped;
+        QSignalSpy states(&page, &GatewayComponentWidget::stateChanged);
+        page.setDeviceRecord(nullptr, levels.path());
+        QCOMPARE(page._levelDocuments->count(), 1);
+        page.setDeviceRecord(&cache, levels.path());
+        QStringList texts, files;
+        for (int i = 1; i < page._levelDocuments->count(); ++i)
+            texts << page._levelDocuments->itemText(i) + "=" + page._levelDocuments->itemData(i).toString();
+        QCOMPARE(texts, QStringList({"a-level=" + levels.filePath("a-level.xml"), "Alpha=" + levels.filePath("Alpha.xml"),
+                                     "b-level=" + levels.filePath("b-level.xml"), "C=" + levels.filePath("C.xml.bak")}));
+        QCOMPARE(page._levelDocuments->currentIndex(), 0);
+        QCOMPARE(states.count(), 0);
+        listLevelFiles(files);
+        QVERIFY(files.size() >= 2);
+        files.sort(Qt::CaseInsensitive);
+        shipped.setDeviceRecord(&cache);
+        texts.clear();
+        for (int i = 1; i < shipped._levelDocuments->count(); ++i)
+            texts << shipped._levelDocuments->itemData(i).toString();
+        QCOMPARE(texts, files);
+    }
+
+    // Families sorted, the rest in file order, every branch open. An export before a choice,
+    // or of an earlier level, never stands for the level shown; an unreadable one keeps it.
+    void checksALevelAgainstTheClasses()
+    {
+        const QString first = m_folder.filePath("first.xml");
+        QVERIFY(TestSupport::writeFile(first, R"(<level><Id value="0x01000001" name="Player"/></level>)"));
+        DeviceCache cache = smallDevice();
+        LevelViewWidget page;
+        page.setDeviceRecord(&cache);
+        QCOMPARE(page.xmlReport(), QString("<!DOCTYPE levelreport>\n<device/>\n"));
+        choose(page, first);
+        QCOMPARE(page.xmlReport(), QString("<!DOCTYPE levelreport>\n<device>\n <family name=\"Media\">\n  <subfamily name=\"Audio\">\n"
+                                           "   <class name=\"Player\" classid=\"0x01000001\" available=\"Found\"/>\n"
+                                           "  </subfamily>\n </family>\n</device>\n"));
+        QSignalSpy statuses(&page, &GatewayComponentWidget::statusChanged);
+        choose(page, m_small);
+        QCOMPARE(signalTexts(statuses), QStringList({"Processing", "Ready"}));
+        QCOMPARE(page.state(), GatewayComponentWidget::Complete);
+        for (QTreeWidgetItemIterator it(page._level1Tree, QTreeWidgetItemIterator::HasChildren); *it; ++it)
+            QVERIFY((*it)->isExpanded());
+        const QString report = page.xmlReport();
+        QCOMPARE(report, QString("<!DOCTYPE levelreport>\n"
+                                 "<device>\n <family name=\"\">\n  <subfamily name=\"\">\n"
+                                 "   <class name=\"Missing\" classid=\"0x01000099\" available=\"Not Found\"/>\n"
+                                 "   <class name=\"AlsoMissing\" classid=\"0x01000098\" available=\"Not Found\"/>\n"
+                                 "  </subfamily>\n </family>\n <family name=\"Kernel\">\n  <subfamily name=\"Memory\">\n"
+                                 "   <class name=\"FromFile\" classid=\"0x0100000A\" available=\"Found\"/>\n"
+                                 "  </subfamily>\n </family>\n <family name=\"media\">\n  <subfamily name=\"Video\">\n"
+                                 "   <class name=\"Camera\" classid=\"0x01000002\" available=\"Found\"/>\n"
+                                 "  </subfamily>\n  <subfamily name=\"Audio\">\n"
+                                 "   <class name=\"Player\" classid=\"0x01000001\" available=\"Found\"/>\n"
+                                 "  </subfamily>\n  <subfamily name=\"audio\">\n"
+                                 "   <class name=\"Mixer\" classid=\"0x01000003\" available=\"Not Found\"/>\n"
+                                 "  </subfamily>\n </family>\n</device>\n"));
+        // Choosing a level that cannot be read, or the prompt again, keeps the tree and its export.
+        const QStringList tree = treeLines(page._level1Tree);
+        choose(page, m_folder.filePath("missing.xml"));
+        QCOMPARE(page.status(), QString("Level file not found"));
+        QCOMPARE(page.state(), GatewayComponentWidget::Failed);
+        QVERIFY(!page.isComplete() && !page.canSearch());
+        QCOMPARE(treeLines(page._level1Tree), tree);
+        QCOMPARE(page.xmlReport(), report);
+        page._levelDocuments->setCurrentIndex(0);
+        QCOMPARE(page.status(), QString("Processing"));
+        QCOMPARE(page.state(), GatewayComponentWidget::Processing);
+        QVERIFY(!page.isComplete() && !page.canSearch());
+        QCOMPARE(treeLines(page._level1Tree), tree);
+    }
+
+    void choiceBeforeTheRecordStaysProcessing()
+    {
+        LevelViewWidget page;
+        choose(page, m_small);
+        QCOMPARE(page.status(), QString("Processing"));
+        QCOMPARE(page._level1Tree->topLevelItemCount(), 0);
+    }
+
+
+    void formatSize()
+    {
+        const QList<QPair<quint64, QString>> sizes = {
+            {9998, "9998 bytes"},           {9999, "9.76 kB"},           {1048575, "1024.00 kB"},
+            {1048576, "1.00 MB"},           {1073741823, "1024.00 MB"},  {1073741824, "1.00 GB"},
+            {~0ULL, "17179869184.00 GB"},
+        };
+        for (const auto& [bytes, text] : sizes)
+            QCOMPARE(::formatSize(bytes), text);
+    }
+
+    void filledFromRecord()
+    {
+        DeviceCache cache;
+        DeviceData& data = cache.deviceData;
+        data.phoneName = "<b>Kestrel</b> & co";
+        data.targetId = "0x00C0FFEE";
+        data.zantVersion = "4.2.1";
+        data.zantBuildNumber = "4210";
+        data.staticBuildId = "S-77";
+        data.dynamicBuildId = "D-78";
+        data.componentServicesBuild = "CS 9.1";
+        data.hardware = {
+            {"Manufacturer", "Norvale"}, {"Model", "K-200"}, {"Firmware", "FW 1.0.7"}, {"ChipID", "NV6"},
+            {"PlatformID", "0x0A01"}, {"QXEVersion", "3.1"}, {"MobileID", "M-55"}, {"ColorDepth", "24"},
+            {"cxScreen", "240"}, {"cyScreen", "320"}, {"FlipPhone", "Yes"}, {"Vibrate", "yes"},
+            {"LocationSupport", "1"}, {"DeviceMDN", "5550100"}, {"IMEI", "490154203237518"}, {"RUIMID", "R-1"},
+            {"HWID", "HW-2"}, {"DeviceIDHash", "9f2c"}, {"HeapMemory", "10240"}, {"HeapFree", "9998"},
+            {"FSTotal", "lots"}, {"FSAvail", "-1"}, {"imei", "lower-case key"},
+        };
+        data.image = {{"PNG", "Yes"}, {"BMP", "Yes"}, {"JPEG", "No"}};
+        data.video = {{"MPEG4", "Yes"}};
+        PhoneInfoWidget page;
+        QSignalSpy states(&page, &GatewayComponentWidget::stateChanged);
+        page.setDeviceRecord(nullptr);
+        QCOMPARE(states.count(), 0);
+        page.setDeviceRecord(&cache);
+
+        // Device texts are shown as they are, never as markup. Sizes: a number, the bytes
+        // threshold, text that is no number, a negative count.
+        const QList<QPair<const char*, QString>> labels = {
+            {"_manufacturer", "Norvale"}, {"_model", "K-200"}, {"_firmware", "FW 1.0.7"}, {"_chipID", "NV6"},
+            {"_platformID", "0x0A01"}, {"_qxeVersion", "3.1"}, {"_mobileID", "M-55"}, {"_colorDepth", "24"},
+            {"_screenWidth", "240"}, {"_screenHeight", "320"}, {"_mdn", "5550100"}, {"_imei", "490154203237518"},
+            {"_ruimid", "R-1"}, {"_hwid", "HW-2"}, {"_deviceIDHash", "9f2c"}, {"_phoneName", "<b>Kestrel</b> & co"},
+            {"_targetID", "0x00C0FFEE"}, {"_zantVersion", "4.2.1"}, {"_zantBuild", "4210"}, {"_staticBuild", "S-77"},
+            {"_dynamicBuild", "D-78"}, {"_csBuild", "CS 9.1"}, {"_totalMemory", "10.00 kB"}, {"_freeMemory", "9998 bytes"},
+            {"_fsSpace", "0 bytes"}, {"_fsFree", "0 bytes"},
+        };
+        for (const auto& [name, text] : labels) {
+            const QLabel* label = page.findChild<QLabel*>(name);
+            QVERIFY2(label && label->text() == text && label->textFormat() == Qt::PlainText, name);
+        }
+        // Only the exact "Yes" checks a box.
+        QVERIFY(page._flipPhone->isChecked());
+        QVERIFY(!page._vibrate->isChecked() && !page._locationSupport->isChecked() && !page._penSupport->isChecked());
+        // Formats sorted by name, each beside its own value.
+        QCOMPARE(columnTexts(page._imageFormats, 0), (QStringList{"BMP", "JPEG", "PNG"}));
+        QCOMPARE(columnTexts(page._imageFormats, 1), (QStringList{"Yes", "No", "Yes"}));
+        QCOMPARE(columnTexts(page._videoFormats, 0), QStringList{"MPEG4"});
+        QCOMPARE(page._audioFormats->rowCount(), 0);
+        QCOMPARE(page.status(), QString("Ready"));
+        QCOMPARE(signalTexts(states), QStringList{"Complete"});
+
+        // A second record replaces the rows and the texts.
+        data.image = {{"GIF", "No"}, {"AVIF", "Yes"}, {"TIFF", "Yes"}};
+        data.hardware.remove("IMEI");
+        page.setDeviceRecord(&cache);
+        QCOMPARE(columnTexts(page._imageFormats, 0), (QStringList{"AVIF", "GIF", "TIFF"}));
+        QCOMPARE(columnTexts(page._imageFormats, 1), (QStringList{"Yes", "No", "Yes"}));
+        QCOMPARE(page._imei->text(), QString());
+    }
+
+private:
+    QTemporaryDir m_folder;
+    QString m_small;
+};
+
+QTEST_MAIN(TestRecordPages)
+#include "tst_recordpages.moc"
