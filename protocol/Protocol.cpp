@@ -39,7 +39,6 @@ const OperationName operationNames[] = {
     { Operation::CopyToDeviceBegin, "CopyToDeviceBegin" },
     { Operation::UploadStream, "UploadStream" },
     { Operation::CopyToDeviceCommit, "CopyToDeviceCommit" },
-    { Operation::UploadAbort, "UploadAbort" },
     { Operation::InstallPackageBegin, "InstallPackageBegin" },
     { Operation::InstallPackageCommit, "InstallPackageCommit" },
     { Operation::RunApplication, "RunApplication" },

@@ -122,8 +122,6 @@ enum class Operation : quint32
     UploadStream = 34,
     // request: quint32 transferId             answer: nothing more (the file is in place)
     CopyToDeviceCommit = 35,
-    // request: quint32 transferId             answer: nothing more (the temporary file is gone)
-    UploadAbort = 36,
     // Package installation: the package is uploaded with UploadStream, then extracted into
     // the volume's module folder on commit.
     // request: quint16 volumeId, QString packageName, quint64 size

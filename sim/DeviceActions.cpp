@@ -76,11 +76,6 @@ Answer DeviceActions::handle(const Request& request)
         return openStream(request, TransferTable::Kind::Upload);
     case Operation::CopyToDeviceCommit:
         return copyToDeviceCommit(request);
-    case Operation::UploadAbort: {
-        // Either kind of upload may be abandoned by its client.
-        const Answer upload = endTransfer(request, TransferTable::Kind::Upload);
-        return upload.result == 0 ? upload : endTransfer(request, TransferTable::Kind::Package);
-    }
     case Operation::InstallPackageBegin:
         return installBegin(request);
     case Operation::InstallPackageCommit:
