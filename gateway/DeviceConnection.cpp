@@ -6,9 +6,11 @@
 #include <QFileInfo>
 #include <QLocalSocket>
 
+#include <poll.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <cerrno>
 
@@ -46,23 +48,88 @@ qint32 DeviceConnection::call(Operation operation, const QByteArray& request, Pr
     return exchange(operation, request, flags, body, deadline);
 }
 
-qint32 DeviceConnection::post(Operation operation, const QByteArray& request, QDeadlineTimer deadline)
+qint32 DeviceConnection::sendStream(Operation operation, const QByteArray& request, QDeadlineTimer deadline)
 {
-    if (m_pending.empty() && !usable()) {
+    if (!usable()) {
         const qint32 opened = open(deadline);
         if (opened != 0)
             return opened;
     }
-    if (!m_socket)
-        return PortlexError::Unreachable;
     return send(operation, request, Protocol::NoFlags, deadline);
 }
 
-qint32 DeviceConnection::collect(Operation operation, QByteArray* body, QDeadlineTimer deadline)
+qint32 DeviceConnection::download(Operation operation, const QByteArray& request, const DataSink& sink,
+                                  QDeadlineTimer deadline)
 {
-    if (!m_socket || m_pending.empty())
-        return fail(PortlexError::ProtocolError, QStringLiteral("No answer is pending"));
-    return receive(operation, body, deadline);
+    qint32 result = sendStream(operation, request, deadline);
+    if (result != 0)
+        return result;
+    const qint64 patience = deadline.remainingTime();
+    QByteArray data(int(Protocol::TransferChunkSize), Qt::Uninitialized);
+    for (;;) {
+        char header[Protocol::HeaderSize];
+        if ((result = readExactly(header, Protocol::HeaderSize, deadline)) != 0)
+            return result;
+        Frame frame;
+        quint32 size = 0;
+        QString error;
+        if (!FrameDecoder::parseHeader(header, Protocol::MaxPayloadSize, &frame, &size, &error))
+            return fail(PortlexError::ProtocolError, error);
+        if (!answersPending(frame, operation))
+            return fail(PortlexError::ProtocolError, QStringLiteral("Frame does not match the request"));
+        deadline.setRemainingTime(patience);
+        if (frame.flags & Protocol::DataFlag) {
+            if (size > Protocol::TransferChunkSize)
+                return fail(PortlexError::ProtocolError, QStringLiteral("Data frame of %1 bytes").arg(size));
+            if ((result = readExactly(data.data(), size, deadline)) != 0)
+                return result;
+            if ((result = sink(data.constData(), size)) != 0)
+                return fail(result, QStringLiteral("The download was stopped on this side (%1)").arg(result));
+            continue;
+        }
+        if (frame.flags & Protocol::StillWorking)
+            continue;
+        frame.payload.resize(size);
+        if ((result = readExactly(frame.payload.data(), size, deadline)) != 0)
+            return result;
+        QByteArray body;
+        return takeAnswer(frame, operation, &body);
+    }
+}
+
+qint32 DeviceConnection::upload(Operation operation, const QByteArray& request, int file, quint64 size,
+                                const UploadProgress& progress, QDeadlineTimer deadline)
+{
+    qint32 result = sendStream(operation, request, deadline);
+    if (result != 0)
+        return result;
+    const qint64 patience = deadline.remainingTime();
+    Frame header;
+    header.flags = Protocol::DataFlag;
+    header.requestId = m_pending.back();
+    header.operation = quint32(operation);
+    QByteArray frame(int(Protocol::HeaderSize + Protocol::TransferChunkSize), Qt::Uninitialized);
+    quint64 sent = 0;
+    // An answer before the end is a refusal: stop sending and read it.
+    while (sent < size && !answerWaiting()) {
+        const quint32 length = quint32(std::min<quint64>(size - sent, Protocol::TransferChunkSize));
+        qint64 read = 0;
+        while (read < length) {
+            const ssize_t got = ::pread(file, frame.data() + Protocol::HeaderSize + read, length - read, off_t(sent + read));
+            if (got <= 0 && !(got < 0 && errno == EINTR))
+                return fail(PortlexError::LocalFileError, QStringLiteral("The file to send could not be read"));
+            read += std::max<ssize_t>(got, 0);
+        }
+        header.encodeHeader(frame.data(), length);
+        if ((result = writeAll(frame.constData(), Protocol::HeaderSize + length, deadline)) != 0)
+            return result;
+        sent += length;
+        deadline.setRemainingTime(patience);
+        if (progress && (result = progress(sent)) != 0)
+            return fail(result, QStringLiteral("The upload was stopped on this side (%1)").arg(result));
+    }
+    QByteArray body;
+    return receive(operation, &body, deadline);
 }
 
 bool DeviceConnection::startHandshake()
@@ -148,7 +215,7 @@ bool DeviceConnection::usable()
     if (!m_socket || !m_greeted || m_socket->state() != QLocalSocket::ConnectedState)
         return false;
     // A device that went away since the last call shows up as end of file now; bytes
-    // nobody asked for (or answers still owed to a cut pipeline) mean the stream is out of step. Either way, start afresh. One
+    // nobody asked for (or answers still owed to a cut stream) mean the stream is out of step. Either way, start afresh. One
     // non-blocking peek tells both apart from a healthy idle connection.
     char probe;
     const ssize_t peeked = ::recv(int(m_socket->socketDescriptor()), &probe, 1, MSG_PEEK | MSG_DONTWAIT);
@@ -218,6 +285,11 @@ qint32 DeviceConnection::receive(Operation operation, QByteArray* body, QDeadlin
         m_decoder.feed(m_socket->readAll());
     }
 
+    return takeAnswer(frame, operation, body);
+}
+
+qint32 DeviceConnection::takeAnswer(const Frame& frame, Operation operation, QByteArray* body)
+{
     if (!answersPending(frame, operation))
         return fail(PortlexError::ProtocolError, QStringLiteral("Answer does not match the request"));
     m_pending.pop_front();
@@ -228,6 +300,70 @@ qint32 DeviceConnection::receive(Operation operation, QByteArray* body, QDeadlin
         return fail(PortlexError::ProtocolError, QStringLiteral("Answer without a result"));
     *body = frame.payload.mid(sizeof(qint32));
     return result;
+}
+
+qint32 DeviceConnection::waitFor(short events, QDeadlineTimer deadline)
+{
+    pollfd watched { int(m_socket->socketDescriptor()), events, 0 };
+    for (;;) {
+        const int ready = ::poll(&watched, 1, int(std::max<qint64>(deadline.remainingTime(), 0)));
+        if (ready > 0)
+            return 0;
+        if (ready == 0)
+            return fail(PortlexError::Timeout, QStringLiteral("The device gave no sign of life in time"));
+        if (errno != EINTR)
+            return fail(PortlexError::Unreachable, QStringLiteral("The connection failed"));
+    }
+}
+
+qint32 DeviceConnection::readExactly(char* data, qint64 size, QDeadlineTimer deadline)
+{
+    // What the decoder or the socket object hold already comes first.
+    qint64 done = m_decoder.take(data, size);
+    if (done < size && m_socket->bytesAvailable() > 0)
+        done += std::max<qint64>(m_socket->read(data + done, size - done), 0);
+    const int descriptor = int(m_socket->socketDescriptor());
+    while (done < size) {
+        const ssize_t got = ::recv(descriptor, data + done, size_t(size - done), MSG_DONTWAIT);
+        if (got > 0) {
+            done += got;
+        } else if (got == 0) {
+            return fail(PortlexError::Unreachable, QStringLiteral("The device closed the connection"));
+        } else if (errno == EAGAIN || errno == EWOULDBLOCK) {
+            const qint32 waited = waitFor(POLLIN, deadline);
+            if (waited != 0)
+                return waited;
+        } else if (errno != EINTR) {
+            return fail(PortlexError::Unreachable, QStringLiteral("The connection failed"));
+        }
+    }
+    return 0;
+}
+
+qint32 DeviceConnection::writeAll(const char* data, qint64 size, QDeadlineTimer deadline)
+{
+    const int descriptor = int(m_socket->socketDescriptor());
+    qint64 done = 0;
+    while (done < size) {
+        const ssize_t written = ::send(descriptor, data + done, size_t(size - done), MSG_NOSIGNAL | MSG_DONTWAIT);
+        if (written >= 0) {
+            done += written;
+        } else if (errno == EAGAIN || errno == EWOULDBLOCK) {
+            const qint32 waited = waitFor(POLLOUT, deadline);
+            if (waited != 0)
+                return waited;
+        } else if (errno != EINTR) {
+            return fail(PortlexError::Unreachable, QStringLiteral("The device closed the connection"));
+        }
+    }
+    return 0;
+}
+
+bool DeviceConnection::answerWaiting()
+{
+    char probe;
+    return m_decoder.hasPartialFrame() || m_socket->bytesAvailable() > 0
+        || ::recv(int(m_socket->socketDescriptor()), &probe, 1, MSG_PEEK | MSG_DONTWAIT) > 0;
 }
 
 bool DeviceConnection::answersPending(const Frame& frame, Operation operation) const

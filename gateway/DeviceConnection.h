@@ -7,6 +7,7 @@
 #include <QString>
 
 #include <deque>
+#include <functional>
 #include <memory>
 
 class QLocalSocket;
@@ -41,12 +42,17 @@ public:
     qint32 call(Operation operation, const QByteArray& request, Protocol::RequestFlags flags, QByteArray* body,
                 QDeadlineTimer deadline);
 
-    // Pipelining, for transfers: post sends a request without waiting for its answer;
-    // collect waits for the answer to the oldest posted request (answers come in request
-    // order). A failure of either drops the connection and every pending answer.
-    qint32 post(Operation operation, const QByteArray& request, QDeadlineTimer deadline);
-    qint32 collect(Operation operation, QByteArray* body, QDeadlineTimer deadline);
-    int pendingAnswers() const { return int(m_pending.size()); }
+    // Bulk transfers: the stream requests of Protocol.h. download sends the request and
+    // hands the bytes of each Data frame to sink as they come; upload sends the request,
+    // then size bytes of the open file from its start as Data frames, and calls progress
+    // with the bytes sent after each. A non-zero code from sink or progress ends the call
+    // with that code and drops the connection, so the device discards the transfer. Every
+    // frame restarts the deadline.
+    using DataSink = std::function<qint32(const char* data, qint64 size)>;
+    using UploadProgress = std::function<qint32(quint64 sent)>;
+    qint32 download(Operation operation, const QByteArray& request, const DataSink& sink, QDeadlineTimer deadline);
+    qint32 upload(Operation operation, const QByteArray& request, int file, quint64 size,
+                  const UploadProgress& progress, QDeadlineTimer deadline);
 
     // Discovery in two steps, so that many devices can be asked at once: start connects
     // and sends the handshake without waiting for it; finish waits for the answer.
@@ -66,6 +72,17 @@ private:
                     QDeadlineTimer deadline);
     qint32 send(Operation operation, const QByteArray& request, Protocol::RequestFlags flags, QDeadlineTimer deadline);
     qint32 receive(Operation operation, QByteArray* body, QDeadlineTimer deadline);
+    // Sends a stream request, on a new connection if need be.
+    qint32 sendStream(Operation operation, const QByteArray& request, QDeadlineTimer deadline);
+    // The answer's result, its fields after the result into body.
+    qint32 takeAnswer(const Frame& frame, Operation operation, QByteArray* body);
+    // Raw stream access for bulk data, past the decoder: both fail the connection and
+    // return the code on failure, else 0.
+    qint32 readExactly(char* data, qint64 size, QDeadlineTimer deadline);
+    qint32 writeAll(const char* data, qint64 size, QDeadlineTimer deadline);
+    // Waits for the socket to be ready for POLLIN or POLLOUT; 0, or the failure's code.
+    qint32 waitFor(short events, QDeadlineTimer deadline);
+    bool answerWaiting();
     qint32 fail(qint32 code, const QString& message);
     bool answersPending(const Frame& frame, Operation operation) const;
 

@@ -5,11 +5,13 @@
 #include "PortlexErrors.h"
 #include "RecordStreams.h"
 #include "ThreadConnections.h"
-#include "TransferPipeline.h"
+#include "TransferProgress.h"
 
 #include <QFileInfo>
 #include <QMutexLocker>
 #include <QSaveFile>
+
+#include <fcntl.h>
 
 namespace {
 
@@ -250,18 +252,21 @@ EnablementStatus _ZantDevice::enablement(Operation operation, QString& mode, QSt
     return EnablementStatus(status);
 }
 
-int _ZantDevice::upload(quint32 transferId, QIODevice& source)
+int _ZantDevice::upload(Operation operation, quint32 transferId, QFile& source, PortlexProgressCallback callback,
+                        void* context)
 {
+    const quint64 size = quint64(source.size());
+    const TransferProgress progress(callback, context, size);
+    if (progress.cancelled(0))
+        return PortlexError::Cancelled;
     DeviceConnection& connection = ThreadConnections::forDevice(m_lifetime, socketPath());
-    const int result = TransferPipeline(connection).upload(transferId, source, quint64(source.size()));
-    if (result == PortlexError::LocalFileError) {
-        QByteArray body;
-        call(Operation::UploadAbort, pack(transferId), &body);
-    }
-    return result;
+    return connection.upload(operation, pack(transferId, size), source.handle(), size,
+                             [&progress](quint64 sent) { return progress.cancelled(sent) ? qint32(PortlexError::Cancelled) : 0; },
+                             QDeadlineTimer(DeviceConnection::callTimeoutMs()));
 }
 
-int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPath)
+int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPath, PortlexProgressCallback callback,
+                              void* context)
 {
     quint32 transferId = 0;
     quint64 size = 0;
@@ -269,15 +274,38 @@ int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPat
     if (result != 0)
         return result;
     QSaveFile sink(localPath);
-    if (sink.open(QIODevice::WriteOnly)) {
-        DeviceConnection& connection = ThreadConnections::forDevice(m_lifetime, socketPath());
-        result = TransferPipeline(connection).download(transferId, sink, size);
-    } else {
+    const TransferProgress progress(callback, context, size);
+    if (!sink.open(QIODevice::WriteOnly))
         result = PortlexError::LocalFileError;
+    else if (progress.cancelled(0))
+        result = PortlexError::Cancelled;
+    const bool started = result == 0;
+    bool streamed = false;
+    if (started) {
+        DeviceConnection& connection = ThreadConnections::forDevice(m_lifetime, socketPath());
+        quint64 received = 0;
+        result = connection.download(
+            Operation::CopyToPCStream, pack(transferId),
+            [&](const char* data, qint64 length) -> qint32 {
+                if (quint64(length) > size - received)
+                    return PortlexError::ProtocolError;
+                if (sink.write(data, length) != length)
+                    return PortlexError::LocalFileError;
+                // The save file syncs to disk on commit: start the write-back as the bytes
+                // come, so that the commit waits for the last few only.
+                ::sync_file_range(sink.handle(), off64_t(received), length, SYNC_FILE_RANGE_WRITE);
+                received += quint64(length);
+                return progress.cancelled(received) ? qint32(PortlexError::Cancelled) : 0;
+            },
+            QDeadlineTimer(DeviceConnection::callTimeoutMs()));
+        streamed = result == 0;
+        // The file shrank on the device while it was sent.
+        if (streamed && received != size)
+            result = PortlexError::TransferIncomplete;
     }
-    // After a transport failure the connection, and the transfer with it, is gone
-    // already; a clean-up call would only wait for a hung device once more.
-    if (!transportFailure(result)) {
+    // A stream that failed took the transfer with it (the device ended it, or the dropped
+    // connection did); otherwise it is still open.
+    if (streamed || !started) {
         QByteArray body;
         const int ended = call(Operation::CopyToPCEnd, pack(transferId), &body);
         if (result == 0)
@@ -290,7 +318,8 @@ int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPat
     return sink.commit() ? 0 : int(PortlexError::LocalFileError);
 }
 
-int _ZantDevice::CopyFileToDevice(const QString& localPath, const QString& devicePath)
+int _ZantDevice::CopyFileToDevice(const QString& localPath, const QString& devicePath, PortlexProgressCallback callback,
+                                  void* context)
 {
     QFile source(localPath);
     if (!QFileInfo(localPath).isFile() || !source.open(QIODevice::ReadOnly))
@@ -299,7 +328,7 @@ int _ZantDevice::CopyFileToDevice(const QString& localPath, const QString& devic
     int result = query(Operation::CopyToDeviceBegin, pack(devicePath, quint64(source.size())), transferId);
     if (result != 0)
         return result;
-    result = upload(transferId, source);
+    result = upload(Operation::UploadStream, transferId, source, callback, context);
     if (result != 0)
         return result;
     QByteArray body;
@@ -323,7 +352,7 @@ int _ZantDevice::InstallPackage(const QString& localPath, unsigned short volumeI
         begun >> transferId;
     begun >> status;
     if (result == 0 && begun.ok())
-        result = upload(transferId, package);
+        result = upload(Operation::UploadStream, transferId, package, nullptr, nullptr);
     if (result == 0) {
         result = call(Operation::InstallPackageCommit, pack(transferId), &body);
         PayloadStream committed(body);

@@ -32,6 +32,8 @@
 // clean-up call follows: the device drops the connection's transfers with it. Results
 // are 0 for success, else a code from PortlexErrors.h or one the device chose; on
 // failure the output arguments are unchanged.
+class QFile;
+
 class _ZantDevice
 {
 public:
@@ -65,10 +67,14 @@ public:
     EnablementStatus TepStatus(QString& mode, QString& owner, QString& expiry);
     EnablementStatus GlobalTestSigStatus(QString& mode, QString& owner, QString& expiry);
 
-    // Transfers stream in chunks and land under a temporary name that is renamed when
-    // complete: a failed or cut copy leaves no partial file on either side.
-    int CopyFileToPC(const QString& devicePath, const QString& localPath);
-    int CopyFileToDevice(const QString& localPath, const QString& devicePath);
+    // Transfers stream the file's bytes and land under a temporary name that is renamed
+    // when complete: a failed, cut or cancelled copy leaves no partial file on either side.
+    // callback (may be null) gets (-1, size in KiB) first, then (KiB done, size in KiB)
+    // as the bytes move, on the calling thread; true from it stops the copy (Cancelled).
+    int CopyFileToPC(const QString& devicePath, const QString& localPath, PortlexProgressCallback callback = nullptr,
+                     void* context = nullptr);
+    int CopyFileToDevice(const QString& localPath, const QString& devicePath, PortlexProgressCallback callback = nullptr,
+                         void* context = nullptr);
     // Sends a .zantro package to be extracted into the volume's install folder; statusText
     // tells the outcome (why it was refused, on failure).
     int InstallPackage(const QString& localPath, unsigned short volumeId);
@@ -91,9 +97,9 @@ private:
     template <typename... Fields>
     int query(Operation operation, const QByteArray& request, Fields&... fields);
     EnablementStatus enablement(Operation operation, QString& mode, QString& owner, QString& expiry);
-    // Streams source into the open upload transferId; aborts it on the device when the
-    // local file fails.
-    int upload(quint32 transferId, QIODevice& source);
+    // Streams source into the open upload transferId; a failure ends the transfer on the
+    // device.
+    int upload(Operation operation, quint32 transferId, QFile& source, PortlexProgressCallback callback, void* context);
 
     mutable QMutex m_mutex;
     QString m_socketPath;

@@ -16,4 +16,7 @@ struct Frame
     // Header and payload as they go on the wire. The payload must not exceed
     // Protocol::MaxPayloadSize.
     QByteArray encode() const;
+    // Writes the header of a frame with payloadSize bytes to out (HeaderSize bytes), for a
+    // sender that puts the payload behind it itself.
+    void encodeHeader(char* out, quint32 payloadSize) const;
 };

@@ -23,6 +23,13 @@ public:
 
     void feed(const QByteArray& bytes);
     Status next(Frame* frame);
+    // Hands over up to max buffered bytes not yet taken as frames, for a reader that
+    // goes on reading the stream itself.
+    qint64 take(char* data, qint64 max);
+
+    // Reads a header (HeaderSize bytes): its fields into frame (payload untouched) and the
+    // payload's size; false with a reason in error when it cannot start a frame.
+    static bool parseHeader(const char* header, quint32 maxPayload, Frame* frame, quint32* size, QString* error);
 
     // True while bytes of an unfinished frame are buffered.
     bool hasPartialFrame() const { return m_buffer.size() > m_offset; }

@@ -90,31 +90,39 @@ enum class Operation : quint32
 
     // --- actions -------------------------------------------------------------------------
     // Transfers are bound to their connection: a connection that closes aborts its open
-    // transfers, and the device removes their temporary files. The client keeps a few chunk
-    // requests in flight (answers come back in request order), so a transfer is not bound
-    // by round trips; each chunk has the call timeout of its own. A chunk the device fails
-    // ends its transfer.
+    // transfers, and the device removes their temporary files.
     //
-    // Copy from the device: the device opens the file and streams it.
+    // Bulk data: a file's bytes move as Data frames (the Data flag on an answer or a
+    // request) of one stream request: the frame's request id and operation are the stream
+    // request's, its payload is raw file bytes (no QDataStream), at most TransferChunkSize.
+    // A stream costs one round trip however long the file; each Data frame restarts the
+    // receiver's timeout as a StillWorking notice does. Data frames of a stream that has
+    // been answered already are dropped by the device, so a client may finish the frame it
+    // is sending after an early refusal and stay in step.
+    //
+    // Copy from the device: the device opens the file.
     // request: QString devicePath             answer: quint32 transferId, quint64 size
     CopyToPCBegin = 30,
-    // request: quint32 transferId, quint32 maxBytes (at most TransferChunkSize)
-    // answer:  QByteArray bytes, empty at the end of the file
-    CopyToPCChunk = 31,
+    // request: quint32 transferId
+    // The device sends the rest of the file as Data answer frames, then the answer; a
+    // failure answer may follow any number of Data frames.
+    // answer:  nothing more
+    CopyToPCStream = 31,
     // request: quint32 transferId             answer: nothing more
     CopyToPCEnd = 32,
     // Copy to the device: the device writes a temporary file beside the target and renames
     // it on commit, so a cut transfer leaves nothing. A size above the free space is refused.
     // request: QString devicePath, quint64 size     answer: quint32 transferId
     CopyToDeviceBegin = 33,
-    // request: quint32 transferId, QByteArray bytes (at most TransferChunkSize)
+    // request: quint32 transferId, quint64 size (the bytes the transfer still expects)
+    // The client sends size bytes as Data request frames right after the request, without
+    // waiting. The device answers once it has them all, or at once on a refusal or failure
+    // (which ends the transfer).
     // answer:  nothing more
-    UploadChunk = 34,
+    UploadStream = 34,
     // request: quint32 transferId             answer: nothing more (the file is in place)
     CopyToDeviceCommit = 35,
-    // request: quint32 transferId             answer: nothing more (the temporary file is gone)
-    UploadAbort = 36,
-    // Package installation: the package is uploaded with UploadChunk, then extracted into
+    // Package installation: the package is uploaded with UploadStream, then extracted into
     // the volume's module folder on commit.
     // request: quint16 volumeId, QString packageName, quint64 size
     // answer:  quint32 transferId (on success only), then QString statusText whatever the result
@@ -131,12 +139,12 @@ enum class Operation : quint32
 namespace Protocol {
 
 constexpr quint32 FrameMagic = 0x5A4E5452;  // "ZNTR"
-constexpr quint16 ProtocolVersion = 1;
+constexpr quint16 ProtocolVersion = 2;
 constexpr QDataStream::Version StreamVersion = QDataStream::Qt_6_4;
 constexpr int HeaderSize = 20;
 constexpr quint32 MaxPayloadSize = 16 * 1024 * 1024;
 constexpr quint32 TransferChunkSize = 1024 * 1024;
-// A request carries at most one chunk and a few texts.
+// A request carries at most one chunk of file data and a few texts.
 constexpr quint32 MaxRequestSize = TransferChunkSize + 64 * 1024;
 
 // Every gateway call completes or fails after this long without a frame from the device.
@@ -161,6 +169,9 @@ enum AnswerFlag : quint16
 {
     StillWorking = 0x1,  // not the answer yet: the device is busy with the request
 };
+
+// On a request or an answer: raw file bytes of the stream request named by the id.
+constexpr quint16 DataFlag = 0x8000;
 
 bool isKnownOperation(quint32 value);
 // The operation's name as written in this header ("GetRegistry"); empty when unknown.

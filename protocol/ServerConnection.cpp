@@ -1,5 +1,7 @@
 #include "ServerConnection.h"
 
+#include "FrameDecoder.h"
+#include "PayloadStream.h"
 #include "PortlexErrors.h"
 #include "RequestHandler.h"
 
@@ -7,12 +9,26 @@
 #include <QPointer>
 #include <QtDebug>
 
+#include <sys/socket.h>
+
+#include <algorithm>
+#include <cerrno>
 #include <memory>
 
 namespace {
 
 // At most one whole request is read from the socket at a time.
 constexpr qint64 ReadSize = Protocol::HeaderSize + Protocol::MaxRequestSize;
+
+bool isDownload(const Frame& request)
+{
+    return request.operation == quint32(Operation::CopyToPCStream);
+}
+
+bool isStream(quint32 operation)
+{
+    return operation == quint32(Operation::CopyToPCStream) || operation == quint32(Operation::UploadStream);
+}
 
 } // namespace
 
@@ -45,7 +61,7 @@ void ServerConnection::shutdown()
 
 qint64 ServerConnection::bufferedBytes() const
 {
-    return unsentBytes() + m_decoder.bufferedBytes() + m_socket->bytesAvailable();
+    return unsentBytes() + m_reading.payload.size() + m_piece.size() + m_socket->bytesAvailable();
 }
 
 qint64 ServerConnection::unsentBytes() const
@@ -55,32 +71,69 @@ qint64 ServerConnection::unsentBytes() const
 
 void ServerConnection::onReadyRead()
 {
-    Frame frame;
     while (!m_closing) {
         // A client that does not take its answers gets no more served; what it sends
         // meanwhile waits in the kernel.
-        m_paused = unsentBytes() > MaxUnsentBytes;
-        if (m_paused)
+        m_paused = unsentBytes() > MaxUnsentBytes || (m_stream && isDownload(m_stream->request));
+        if (m_paused || m_socket->bytesAvailable() == 0)
             break;
-        const FrameDecoder::Status status = m_decoder.next(&frame);
-        if (status == FrameDecoder::Status::Malformed) {
-            refuse(m_decoder.errorString());
-            return;
-        }
-        if (status == FrameDecoder::Status::Ready) {
-            if (!dispatch(frame))
-                return;
-        } else if (m_socket->bytesAvailable() > 0) {
-            m_decoder.feed(m_socket->read(ReadSize));
+        if (m_headerFill < Protocol::HeaderSize) {
+            m_headerFill += std::max<qint64>(m_socket->read(m_header + m_headerFill, Protocol::HeaderSize - m_headerFill), 0);
+            if (m_headerFill < Protocol::HeaderSize || !startFrame())
+                continue;
+        } else if (m_reading.flags & Protocol::DataFlag) {
+            // File bytes go to the upload as they come, not gathered into frames first.
+            const qint64 got = m_socket->read(m_piece.data(), std::min<qint64>(m_piece.size(), m_payloadLeft));
+            m_payloadLeft -= std::max<qint64>(got, 0);
+            receiveUpload(m_reading.requestId, m_piece.constData(), got);
         } else {
-            break;
+            const qint64 offset = m_reading.payload.size() - m_payloadLeft;
+            m_payloadLeft -= std::max<qint64>(m_socket->read(m_reading.payload.data() + offset, m_payloadLeft), 0);
         }
+        if (m_payloadLeft == 0 && !finishFrame())
+            return;
     }
     updateHalfOpenTimer();
 }
 
+bool ServerConnection::startFrame()
+{
+    quint32 size = 0;
+    QString error;
+    if (!FrameDecoder::parseHeader(m_header, Protocol::MaxRequestSize, &m_reading, &size, &error)) {
+        refuse(error);
+        return false;
+    }
+    m_payloadLeft = size;
+    if (m_reading.flags & Protocol::DataFlag) {
+        if (!m_greeted || m_reading.version != Protocol::ProtocolVersion) {
+            refuse(QStringLiteral("data frame outside a stream"));
+            return false;
+        }
+        m_piece.resize(std::min<qint64>(size, Protocol::TransferChunkSize));
+        m_reading.payload.clear();
+    } else {
+        m_reading.payload.resize(size);
+    }
+    return true;
+}
+
+bool ServerConnection::finishFrame()
+{
+    m_headerFill = 0;
+    if (m_reading.flags & Protocol::DataFlag)
+        return true;
+    const bool open = dispatch(m_reading);
+    m_reading.payload.clear();
+    return open;
+}
+
 void ServerConnection::resumeWhenDrained()
 {
+    if (m_stream && isDownload(m_stream->request)) {
+        sendDownload();
+        return;
+    }
     if (m_paused && !m_closing && unsentBytes() <= MaxUnsentBytes) {
         m_paused = false;
         // Requests already in the socket's buffer raise no new readyRead.
@@ -129,8 +182,88 @@ bool ServerConnection::dispatch(const Frame& frame)
     };
     const Answer answer = m_handler->handle(request);
     *answering = false;
-    send(frame, answer.result, answer.body);
+    if (answer.result == 0 && isStream(frame.operation))
+        startStream(frame);
+    else
+        send(frame, answer.result, answer.body);
     return true;
+}
+
+void ServerConnection::startStream(const Frame& request)
+{
+    Stream stream;
+    stream.request = request;
+    stream.request.payload.clear();
+    PayloadStream in(request.payload);
+    in >> stream.transferId;
+    if (!isDownload(request))
+        in >> stream.expected;
+    if (!in.ok()) {
+        send(request, PortlexError::BadRequest, QByteArray());
+        return;
+    }
+    m_stream = stream;
+    if (isDownload(request))
+        sendDownload();
+    else if (stream.expected == 0)
+        endStream(0);
+}
+
+void ServerConnection::sendDownload()
+{
+    Frame header = m_stream->request;
+    header.flags = Protocol::DataFlag;
+    m_dataFrame.resize(Protocol::HeaderSize + Protocol::TransferChunkSize);
+    // One frame at a time, and only once the last is out: the client sets the pace.
+    while (m_stream && !m_closing && unsentBytes() == 0) {
+        const qint64 got = m_handler->readStream(m_id, m_stream->transferId, m_dataFrame.data() + Protocol::HeaderSize,
+                                                 Protocol::TransferChunkSize);
+        if (got <= 0) {
+            endStream(qint32(-got));
+            return;
+        }
+        header.encodeHeader(m_dataFrame.data(), quint32(got));
+        if (m_latencyMs > 0)
+            deliver(m_dataFrame.left(Protocol::HeaderSize + got));
+        else
+            writeDirect(m_dataFrame.constData(), Protocol::HeaderSize + got);
+    }
+}
+
+void ServerConnection::receiveUpload(quint32 requestId, const char* data, qint64 size)
+{
+    // Data of a stream answered already (refused early) is dropped, as the client may
+    // still be finishing it.
+    if (size <= 0 || !m_stream || isDownload(m_stream->request) || requestId != m_stream->request.requestId)
+        return;
+    const qint32 result = m_handler->writeStream(m_id, m_stream->transferId, data, size);
+    m_stream->expected -= std::min<quint64>(m_stream->expected, quint64(size));
+    if (result != 0 || m_stream->expected == 0)
+        endStream(result);
+}
+
+void ServerConnection::endStream(qint32 result)
+{
+    const Frame request = m_stream->request;
+    m_stream.reset();
+    send(request, result, QByteArray());
+    // Requests that came while a download was sent raise no new readyRead.
+    QMetaObject::invokeMethod(this, &ServerConnection::onReadyRead, Qt::QueuedConnection);
+}
+
+void ServerConnection::writeDirect(const char* data, qint64 size)
+{
+    ssize_t written = 0;
+    if (m_socket->bytesToWrite() == 0) {
+        written = ::send(int(m_socket->socketDescriptor()), data, size_t(size), MSG_NOSIGNAL | MSG_DONTWAIT);
+        if (written < 0 && errno != EAGAIN && errno != EWOULDBLOCK) {
+            refuse(QStringLiteral("the client went away during a download"));
+            return;
+        }
+        written = std::max<ssize_t>(written, 0);
+    }
+    if (written < size)
+        m_socket->write(data + written, size - written);
 }
 
 void ServerConnection::answerHello(const Frame& frame)
@@ -176,17 +309,24 @@ void ServerConnection::send(const Frame& request, qint32 result, const QByteArra
         out << result;
         out.writeRawData(body.constData(), int(body.size()));
     }
-    const QByteArray bytes = answer.encode();
-    if (m_latencyMs > 0 && request.operation != quint32(Operation::Hello)) {
-        m_delayedBytes += bytes.size();
-        QTimer::singleShot(m_latencyMs, this, [this, bytes] {
-            m_delayedBytes -= bytes.size();
-            write(bytes);
-            resumeWhenDrained();
-        });
-    } else {
+    if (request.operation == quint32(Operation::Hello))
+        write(answer.encode());
+    else
+        deliver(answer.encode());
+}
+
+void ServerConnection::deliver(const QByteArray& bytes)
+{
+    if (m_latencyMs <= 0) {
         write(bytes);
+        return;
     }
+    m_delayedBytes += bytes.size();
+    QTimer::singleShot(m_latencyMs, this, [this, bytes] {
+        m_delayedBytes -= bytes.size();
+        write(bytes);
+        resumeWhenDrained();
+    });
 }
 
 void ServerConnection::sendStillWorking(quint32 requestId, quint32 operation)
@@ -218,7 +358,7 @@ void ServerConnection::updateHalfOpenTimer()
     if (m_closing)
         return;
     // A frame left unread by back-pressure is the device's doing, not the client's.
-    const bool halfOpen = !m_greeted || (m_decoder.hasPartialFrame() && !m_paused);
+    const bool halfOpen = !m_greeted || (m_headerFill > 0 && !m_paused);
     if (!halfOpen)
         m_halfOpenTimer.stop();
     else if (!m_halfOpenTimer.isActive())

@@ -66,21 +66,16 @@ Answer DeviceActions::handle(const Request& request)
     switch (request.operation) {
     case Operation::CopyToPCBegin:
         return copyToPCBegin(request);
-    case Operation::CopyToPCChunk:
-        return copyToPCChunk(request);
+    case Operation::CopyToPCStream:
+        return openStream(request, TransferTable::Kind::Download);
     case Operation::CopyToPCEnd:
         return endTransfer(request, TransferTable::Kind::Download);
     case Operation::CopyToDeviceBegin:
         return copyToDeviceBegin(request);
-    case Operation::UploadChunk:
-        return uploadChunk(request);
+    case Operation::UploadStream:
+        return openStream(request, TransferTable::Kind::Upload);
     case Operation::CopyToDeviceCommit:
         return copyToDeviceCommit(request);
-    case Operation::UploadAbort: {
-        // Either kind of upload may be abandoned by its client.
-        const Answer upload = endTransfer(request, TransferTable::Kind::Upload);
-        return upload.result == 0 ? upload : endTransfer(request, TransferTable::Kind::Package);
-    }
     case Operation::InstallPackageBegin:
         return installBegin(request);
     case Operation::InstallPackageCommit:
@@ -138,27 +133,67 @@ Answer DeviceActions::copyToPCBegin(const Request& request)
     return Answer::success(m_transfers.add(std::move(transfer)), size);
 }
 
-Answer DeviceActions::copyToPCChunk(const Request& request)
+TransferTable::Transfer* DeviceActions::streamed(quint64 connectionId, quint32 id, TransferTable::Kind kind)
+{
+    TransferTable::Transfer* transfer = m_transfers.find(id, connectionId, kind);
+    // Either kind of upload takes its bytes the same way.
+    if (!transfer && kind == TransferTable::Kind::Upload)
+        transfer = m_transfers.find(id, connectionId, TransferTable::Kind::Package);
+    if (transfer)
+        transfer->lastActive = m_now = m_clock();
+    return transfer;
+}
+
+Answer DeviceActions::openStream(const Request& request, TransferTable::Kind kind)
 {
     PayloadStream in(request.payload);
     quint32 id = 0;
-    quint32 maxBytes = 0;
-    in >> id >> maxBytes;
+    quint64 size = 0;
+    in >> id;
+    if (kind == TransferTable::Kind::Upload)
+        in >> size;
     if (!in.ok())
         return Answer::failure(PortlexError::BadRequest);
-    TransferTable::Transfer* transfer = m_transfers.find(id, request.connectionId, TransferTable::Kind::Download);
+    TransferTable::Transfer* transfer = streamed(request.connectionId, id, kind);
     if (!transfer)
         return Answer::failure(PortlexError::NotFound);
-    QByteArray bytes(int(std::min(maxBytes, Protocol::TransferChunkSize)), Qt::Uninitialized);
-    const qint64 got = transfer->file->read(bytes.data(), bytes.size());
+    if (kind == TransferTable::Kind::Upload && size != transfer->size - transfer->done) {
+        m_transfers.discard(id);
+        return Answer::failure(PortlexError::TransferIncomplete);
+    }
+    return Answer();
+}
+
+qint64 DeviceActions::readStream(quint64 connectionId, quint32 id, char* data, qint64 max)
+{
+    TransferTable::Transfer* transfer = streamed(connectionId, id, TransferTable::Kind::Download);
+    if (!transfer)
+        return -qint64(PortlexError::NotFound);
+    const qint64 got = transfer->file->read(data, max);
     if (got < 0) {
         m_transfers.discard(id);
-        return Answer::failure(PortlexError::IoError);
+        return -qint64(PortlexError::IoError);
     }
-    bytes.truncate(int(got));
     transfer->done += quint64(got);
-    transfer->lastActive = m_now;
-    return Answer::success(bytes);
+    return got;
+}
+
+qint32 DeviceActions::writeStream(quint64 connectionId, quint32 id, const char* data, qint64 size)
+{
+    TransferTable::Transfer* transfer = streamed(connectionId, id, TransferTable::Kind::Upload);
+    if (!transfer)
+        return PortlexError::NotFound;
+    qint32 result = 0;
+    if (quint64(size) > transfer->size - transfer->done)
+        result = PortlexError::TransferIncomplete;
+    else if (transfer->file->write(data, size) != size)
+        result = PortlexError::IoError;
+    if (result != 0) {
+        m_transfers.discard(id);
+        return result;
+    }
+    transfer->done += quint64(size);
+    return 0;
 }
 
 Answer DeviceActions::endTransfer(const Request& request, TransferTable::Kind kind)
@@ -213,32 +248,6 @@ Answer DeviceActions::copyToDeviceBegin(const Request& request)
     transfer.size = size;
     transfer.lastActive = m_now;
     return Answer::success(m_transfers.add(std::move(transfer)));
-}
-
-Answer DeviceActions::uploadChunk(const Request& request)
-{
-    PayloadStream in(request.payload);
-    quint32 id = 0;
-    QByteArray bytes;
-    in >> id >> bytes;
-    if (!in.ok())
-        return Answer::failure(PortlexError::BadRequest);
-    TransferTable::Transfer* transfer = m_transfers.find(id, request.connectionId, TransferTable::Kind::Upload);
-    if (!transfer)
-        transfer = m_transfers.find(id, request.connectionId, TransferTable::Kind::Package);
-    if (!transfer)
-        return Answer::failure(PortlexError::NotFound);
-    if (quint64(bytes.size()) > transfer->size - transfer->done) {
-        m_transfers.discard(id);
-        return Answer::failure(PortlexError::TransferIncomplete);
-    }
-    if (transfer->file->write(bytes) != bytes.size()) {
-        m_transfers.discard(id);
-        return Answer::failure(PortlexError::IoError);
-    }
-    transfer->done += quint64(bytes.size());
-    transfer->lastActive = m_now;
-    return Answer();
 }
 
 Answer DeviceActions::copyToDeviceCommit(const Request& request)

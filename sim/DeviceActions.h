@@ -32,14 +32,20 @@ public:
     // The client went away: its unfinished transfers leave nothing behind.
     void connectionClosed(quint64 connectionId) { m_transfers.discardConnection(connectionId); }
 
+    // The bytes of an open transfer's stream (see RequestHandler).
+    qint64 readStream(quint64 connectionId, quint32 id, char* data, qint64 max);
+    qint32 writeStream(quint64 connectionId, quint32 id, const char* data, qint64 size);
+
     // Removes the temporary files and folders that a crash left in the volumes.
     void sweepLeftovers();
 
 private:
     Answer copyToPCBegin(const Request& request);
-    Answer copyToPCChunk(const Request& request);
+    // Accepts a stream request for an open transfer of the connection.
+    Answer openStream(const Request& request, TransferTable::Kind kind);
+    // The connection's open transfer of that kind (an upload: of either kind), marked active.
+    TransferTable::Transfer* streamed(quint64 connectionId, quint32 id, TransferTable::Kind kind);
     Answer copyToDeviceBegin(const Request& request);
-    Answer uploadChunk(const Request& request);
     Answer copyToDeviceCommit(const Request& request);
     Answer installBegin(const Request& request);
     Answer installCommit(const Request& request);

@@ -26,6 +26,14 @@ public:
     QString displayName() const override;
     QString deviceId() const override;
     Answer handle(const Request& request) override;
+    qint64 readStream(quint64 connectionId, quint32 transferId, char* data, qint64 max) override
+    {
+        return m_actions.readStream(connectionId, transferId, data, max);
+    }
+    qint32 writeStream(quint64 connectionId, quint32 transferId, const char* data, qint64 size) override
+    {
+        return m_actions.writeStream(connectionId, transferId, data, size);
+    }
     void connectionClosed(quint64 connectionId) override;
 
     // The operations a request can carry, and their names (what --fail may name).

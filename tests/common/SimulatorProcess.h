@@ -40,6 +40,7 @@ public:
     void resume(); // SIGCONT
 
     bool isRunning() const { return m_process.state() != QProcess::NotRunning; }
+    qint64 processId() const { return m_process.processId(); }
     QString socketPath() const { return m_socketPath; }
     QString errorString() const { return m_error; } // why start failed, with what the simulator printed
 

@@ -33,8 +33,8 @@ constexpr quint32 TransferId = 7;
 // What the socket folder is, or (from File on) what already sits at the socket path.
 enum Place { Missing, Folder, Link, Foreign, File, FileLink, Directory, StaleSocket, ForeignPeer };
 
-// The device: GetVolumes answers 7, GetRegistry fails with 3, a transfer chunk carries 1 MiB
-// (and hangs at hangAtChunk, as a stopped process does), RunApplication works long.
+// The device: GetVolumes answers 7, GetRegistry fails with 3, a download streams streamSize
+// bytes, every stream hangs at its piece hangAtChunk, RunApplication works long.
 class Handler : public RequestHandler
 {
 public:
@@ -55,18 +55,14 @@ public:
             return Answer::success(DeviceCache());
         case Operation::CopyToPCBegin:
             transferConnection = request.connectionId;
-            return Answer::success(TransferId, CopySize);
+            return Answer::success(TransferId, streamSize.load());
         case Operation::CopyToDeviceBegin:
         case Operation::InstallPackageBegin:
             transferConnection = request.connectionId;
             return Answer::success(TransferId, QStringLiteral("begun"));
-        case Operation::CopyToPCChunk:
-        case Operation::UploadChunk:
-            if (++chunks == hangAtChunk)
-                hung.acquire();
-            return request.operation == Operation::UploadChunk
-                ? Answer::success()
-                : Answer::success(QByteArray(Protocol::TransferChunkSize, 'c'));
+        case Operation::CopyToPCStream:
+            streamed = 0;
+            return Answer();
         case Operation::RunApplication:
             for (int i = 0; i < keepAlives; ++i) {
                 request.keepAlive();
@@ -79,7 +75,27 @@ public:
         }
     }
 
-    std::atomic<quint64> lastConnection {0}, transferConnection {0}, lastClosed {0};
+    qint64 readStream(quint64, quint32, char* data, qint64 max) override
+    {
+        pieceDone();
+        const qint64 size = std::min<qint64>(max, qint64(streamSize - streamed));
+        memset(data, 'c', size_t(size));
+        streamed += quint64(size);
+        return size;
+    }
+    qint32 writeStream(quint64, quint32, const char*, qint64) override
+    {
+        pieceDone();
+        return 0;
+    }
+    // A piece of a stream moved; the one at hangAtChunk hangs, as a stopped process does.
+    void pieceDone()
+    {
+        if (++chunks == hangAtChunk)
+            hung.acquire();
+    }
+
+    std::atomic<quint64> lastConnection {0}, transferConnection {0}, lastClosed {0}, streamSize {CopySize}, streamed {0};
     std::atomic<int> handled {0}, chunks {0}, closed {0}, hangAtChunk {0}, keepAlives {0}, silenceMs {0};
     QSemaphore hung;
 };
@@ -365,22 +381,27 @@ private slots:
 
     void unreadAnswersStopReading()
     {
-        constexpr quint32 Requests = 48; // 48 MiB of answers
+        constexpr quint32 Requests = 48; // a 48 MiB download, then requests behind it
         Device device(m_socketPath);
+        device.handler.streamSize = Requests * quint64(Protocol::TransferChunkSize);
         const int flooder = rawSocket(m_socketPath);
         QVERIFY(flooder >= 0);
         const timeval patience {10, 0};
         ::setsockopt(flooder, SOL_SOCKET, SO_RCVTIMEO, &patience, sizeof patience);
         QByteArray flood = helloFrame(Protocol::ProtocolVersion, Protocol::ProtocolVersion);
         Frame request;
-        request.operation = quint32(Operation::CopyToPCChunk);
-        PayloadStream(&request.payload) << TransferId << Protocol::TransferChunkSize;
-        for (request.requestId = 2; request.requestId <= Requests + 1; ++request.requestId)
+        request.requestId = 2;
+        request.operation = quint32(Operation::CopyToPCStream);
+        PayloadStream(&request.payload) << TransferId;
+        flood += request.encode();
+        request.operation = quint32(Operation::GetVolumes);
+        request.payload.clear();
+        for (request.requestId = 3; request.requestId <= Requests + 1; ++request.requestId)
             flood += request.encode();
         QCOMPARE(::write(flooder, flood.constData(), size_t(flood.size())), ssize_t(flood.size()));
 
         // The device stops serving the flooder, not everyone: another client's call is
-        // answered, after the device's pass over what the flooder sent.
+        // answered while the flooder's download waits for it to read.
         QTRY_VERIFY(device.handler.chunks > 0);
         QCOMPARE(call(m_socketPath, Operation::GetVolumes), 0);
         qint64 buffered = 0;
@@ -389,17 +410,24 @@ private slots:
         QVERIFY2(buffered <= ServerConnection::MaxUnsentBytes + 2 * Protocol::TransferChunkSize,
                  qPrintable(QStringLiteral("%1 bytes held").arg(buffered)));
 
-        // Once the flooder reads, every answer comes, in order.
+        // Once the flooder reads, the whole download comes, then every answer, in order.
         FrameDecoder decoder;
         Frame answer;
+        quint64 downloaded = 0;
         for (quint32 expected = 1; expected <= Requests + 1;) {
             QByteArray bytes(256 * 1024, Qt::Uninitialized);
             const ssize_t got = ::read(flooder, bytes.data(), size_t(bytes.size()));
             QVERIFY2(got > 0, "the device stopped answering");
             decoder.feed(bytes.left(got));
-            while (decoder.next(&answer) == FrameDecoder::Status::Ready)
-                QCOMPARE(answer.requestId, expected++);
+            while (decoder.next(&answer) == FrameDecoder::Status::Ready) {
+                QCOMPARE(answer.requestId, expected);
+                if (answer.flags & Protocol::DataFlag)
+                    downloaded += quint64(answer.payload.size());
+                else
+                    ++expected;
+            }
         }
+        QCOMPARE(downloaded, device.handler.streamSize.load());
         ::close(flooder);
     }
 

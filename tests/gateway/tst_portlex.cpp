@@ -301,14 +301,14 @@ private slots:
         QCOMPARE(Portlex::GetDevices(devices), 1u);
     }
 
-    // Byte-exact both ways around the chunk size and through the pipeline; each copy
+    // Byte-exact both ways around the data frame size and for a large file; each copy
     // replaces the one before. Then a package install.
     void copiesAndInstall()
     {
         const QSharedPointer<_ZantDevice> device = serve();
         QVERIFY(device);
-        for (const QByteArray& bytes : { QByteArray(), QByteArray("x"), randomBytes(Protocol::TransferChunkSize, 1),
-                                         randomBytes(Protocol::TransferChunkSize + 1, 2), randomBytes(20 * 1024 * 1024 + 7, 3) }) {
+        for (const QByteArray& bytes : { QByteArray(), QByteArray("x"), randomBytes(Protocol::TransferChunkSize - 1, 1),
+                                         randomBytes(Protocol::TransferChunkSize + 1, 2), randomBytes(300 * 1024 * 1024, 3) }) {
             QVERIFY(writeFile(local(QStringLiteral("source.bin")), bytes));
             QCOMPARE(device->CopyFileToDevice(local(QStringLiteral("source.bin")), QStringLiteral("/user/copied.bin")), 0);
             QCOMPARE(readFile(flash(QStringLiteral("user/copied.bin"))), bytes);
@@ -350,6 +350,54 @@ private slots:
         QCOMPARE(std::count_if(modules.cbegin(), modules.cend(), [](const ModuleInfo& m) { return m.name == QLatin1String("tuner"); }), 1);
         QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 9), int(PortlexError::NotFound));
         QVERIFY(device->statusText.contains(QLatin1String("no volume 9")));
+    }
+
+    // A copy stopped from its progress callback leaves nothing on either side, and the
+    // device goes on serving; two threads copy at once on one device without mixing.
+    void cancelledAndConcurrentCopies()
+    {
+        const QSharedPointer<_ZantDevice> device = serve();
+        QVERIFY(device);
+        const QByteArray bytes = randomBytes(8 * Protocol::TransferChunkSize + 3, 11);
+        QVERIFY(writeFile(local(QStringLiteral("source.bin")), bytes));
+        struct Stop
+        {
+            int calls = 0, stopAt = 4, maximum = 0, last = 0;
+        };
+        const PortlexProgressCallback stopper = [](void* context, int value, int maximum, const QString&) {
+            auto* stop = static_cast<Stop*>(context);
+            stop->maximum = maximum;
+            stop->last = value;
+            return ++stop->calls == stop->stopAt;
+        };
+        // The range, then 0, 1 and 2 MiB done: stopped after the second chunk.
+        Stop up;
+        QCOMPARE(device->CopyFileToDevice(local(QStringLiteral("source.bin")), QStringLiteral("/user/c.bin"), stopper, &up),
+                 int(PortlexError::Cancelled));
+        QCOMPARE(up.maximum, 8 * 1024 + 1);
+        QCOMPARE(up.last, 2 * 1024);
+        QTRY_COMPARE(leftovers(flash()), QStringList());
+        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/c.bin"))));
+
+        QCOMPARE(device->CopyFileToDevice(local(QStringLiteral("source.bin")), QStringLiteral("/user/c.bin")), 0);
+        const QString target = local(QStringLiteral("target"));
+        QVERIFY(QDir().mkpath(target));
+        Stop down;
+        QCOMPARE(device->CopyFileToPC(QStringLiteral("/user/c.bin"), target + QStringLiteral("/c.bin"), stopper, &down),
+                 int(PortlexError::Cancelled));
+        QCOMPARE(down.last, 2 * 1024);
+        QCOMPARE(treeEntries(target), QStringList());
+
+        std::atomic<int> upResult { -1 };
+        std::unique_ptr<QThread> uploader(QThread::create([&] {
+            upResult = device->CopyFileToDevice(local(QStringLiteral("source.bin")), QStringLiteral("/user/d.bin"));
+        }));
+        uploader->start();
+        QCOMPARE(device->CopyFileToPC(QStringLiteral("/user/c.bin"), target + QStringLiteral("/c.bin")), 0);
+        QVERIFY(uploader->wait(HangLimitMs));
+        QCOMPARE(upResult.load(), 0);
+        QCOMPARE(readFile(target + QStringLiteral("/c.bin")), bytes);
+        QCOMPARE(readFile(flash(QStringLiteral("user/d.bin"))), bytes);
     }
 
     void failuresChangeNothing()

@@ -81,7 +81,7 @@ class TestDeviceImage : public QObject
         const Answer begun = act(Operation::CopyToDeviceBegin, pack(path, quint64(bytes.size())));
         if (begun.result != 0)
             return begun;
-        act(Operation::UploadChunk, pack(leading<quint32>(begun), bytes));
+        m_image->handler().actions().writeStream(1, leading<quint32>(begun), bytes.constData(), bytes.size());
         return act(Operation::CopyToDeviceCommit, pack(leading<quint32>(begun)));
     }
     QString writePackage(const std::function<void(PackageWriter&)>& fill)
@@ -96,7 +96,7 @@ class TestDeviceImage : public QObject
     {
         const QByteArray bytes = TestSupport::readFile(package);
         const Answer begun = act(Operation::InstallPackageBegin, pack(quint16(1), QStringLiteral("p.zantro"), quint64(bytes.size())));
-        act(Operation::UploadChunk, pack(leading<quint32>(begun), bytes));
+        m_image->handler().actions().writeStream(1, leading<quint32>(begun), bytes.constData(), bytes.size());
         return act(Operation::InstallPackageCommit, pack(leading<quint32>(begun)), 1, keepAlive);
     }
 
@@ -355,12 +355,12 @@ private slots:
 
         constexpr qint64 limit = DeviceActions::TransferIdleLimitMs;
         now = limit - 1;
-        QCOMPARE(act(Operation::UploadChunk, pack(id, QByteArray("x"))).result, 0); // moving keeps it
+        QCOMPARE(m_image->handler().actions().writeStream(1, id, "x", 1), 0); // moving keeps it
         now = 2 * limit - 1;
         QCOMPARE(other(), int(PortlexError::NoSpace));
         now = 2 * limit; // quiet for longer than the limit
         QCOMPARE(other(), 0);
-        QCOMPARE(act(Operation::UploadChunk, pack(id, QByteArray("y"))).result, int(PortlexError::NotFound));
+        QCOMPARE(m_image->handler().actions().writeStream(1, id, "y", 1), int(PortlexError::NotFound));
         const QStringList partials = QStringList { TransferTable::PartialPrefix + QLatin1Char('*') };
         QCOMPARE(QDir(flash(QStringLiteral("user"))).entryList(partials, QDir::Files | QDir::Hidden).size(), 1); // b.bin's
         QCOMPARE(QDir(flash(QStringLiteral("usermod"))).entryList(partials, QDir::Files | QDir::Hidden).size(), 0);
