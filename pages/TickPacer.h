@@ -26,6 +26,10 @@ public:
 
     // Arms the first tick; the interval is left as it is.
     int armFirst(int delayMs);
+    // Arms one more tick on a second timer, beside the pending one: a page that keeps its
+    // ticking from construction adds a prompt tick when it starts. The extra tick does not
+    // cancel the pending one; re-arming from either tick replaces the pending tick as usual.
+    int armExtra(int delayMs);
     // Nothing to do: the interval grows by IdleStep, up to the cap.
     int armIdle();
     // Work is waiting: the interval becomes busyMs, counted from when the previous busy
@@ -48,6 +52,7 @@ private:
     int arm(int ms);
 
     QTimer m_timer;
+    QTimer m_extra;
     QElapsedTimer m_clock;
     bool m_busyRun = false;
     qint64 m_busyDueNs = 0; // when the last busy tick was due, on m_clock
