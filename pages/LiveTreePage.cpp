@@ -3,6 +3,8 @@
 #include "PageWorkerThread.h"
 #include "Portlex.h"
 
+#include <QSignalBlocker>
+
 namespace {
 
 enum class Aged
@@ -149,13 +151,14 @@ QVector<QTreeWidgetItem*> LiveTreePage::topLevelRows() const
     return rows;
 }
 
-QTreeWidgetItem* LiveTreePage::newProcessRow(const QString& name, quint32 id) const
+QTreeWidgetItem* LiveTreePage::newProcessRow(const QString& name, quint32 id)
 {
     auto* row = new CITreeWidgetItem(ProcessType);
     row->setText(ProcessColumn, name);
     if (m_processIdColumn >= 0)
         row->setText(m_processIdColumn, QString::number(id));
     startLife(row, id, ProcessColumn);
+    m_counting.append(row);
     return row;
 }
 
@@ -163,6 +166,7 @@ QTreeWidgetItem* LiveTreePage::newEntryRow(quint32 id)
 {
     auto* row = new CITreeWidgetItem(EntryType);
     startLife(row, id, EntryColumn);
+    m_counting.append(row);
     return row;
 }
 
@@ -177,6 +181,10 @@ void LiveTreePage::markGone(QTreeWidgetItem* row, int column)
 {
     if (row->data(0, StateRole).toInt() == Gone)
         return;
+    // As in the aging pass: the tick repaints the tree once.
+    const QSignalBlocker quiet(row->treeWidget()->model());
+    if (row->data(0, StateRole).toInt() == Shown)
+        m_counting.append(row);
     row->setData(0, AgeRole, 0);
     row->setData(0, StateRole, Gone);
     // A gone process keeps its colour; a gone entry turns red.
@@ -186,18 +194,27 @@ void LiveTreePage::markGone(QTreeWidgetItem* row, int column)
 
 bool LiveTreePage::ageRows()
 {
-    bool pending = false;
-    for (int i = m_tree->topLevelItemCount() - 1; i >= 0; --i) {
-        QTreeWidgetItem* row = m_tree->topLevelItem(i);
-        if (ageRow(row, ProcessColumn, pending) == Aged::Removed) {
-            delete row;
-            continue;
-        }
-        for (int j = row->childCount() - 1; j >= 0; --j) {
-            QTreeWidgetItem* child = row->child(j);
-            if (ageRow(child, EntryColumn, pending) == Aged::Removed)
-                delete child;
+    QVector<QTreeWidgetItem*> counting;
+    QVector<QTreeWidgetItem*> removals;
+    {
+        // A row's state, age and colour do not move it in the sort; unannounced, they spare
+        // the view a search for every changed row, and it repaints once instead.
+        const QSignalBlocker quiet(m_tree->model());
+        for (QTreeWidgetItem* row : std::as_const(m_counting)) {
+            bool pending = false;
+            if (ageRow(row, row->type() == ProcessType ? ProcessColumn : EntryColumn, pending) == Aged::Removed)
+                removals.append(row);
+            else if (pending)
+                counting.append(row);
         }
     }
-    return pending;
+    // A removed process takes its entries with it.
+    const QSet<QTreeWidgetItem*> removed(removals.cbegin(), removals.cend());
+    const auto goesWithParent = [&removed](QTreeWidgetItem* row) { return row->parent() && removed.contains(row->parent()); };
+    counting.removeIf(goesWithParent);
+    removals.removeIf(goesWithParent);
+    qDeleteAll(removals);
+    m_counting = counting;
+    m_tree->viewport()->update();
+    return !m_counting.isEmpty();
 }

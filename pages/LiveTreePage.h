@@ -98,6 +98,10 @@ protected:
         QVector<Process> list;
         if (!snapshot.take(list))
             return snapshot.hasAnswered() ? Poll::Unchanged : Poll::NoAnswer;
+        // A sorting tree sorts itself whole at the next look at a row after every insertion;
+        // the merge sorts it once, at its end.
+        const bool sorting = m_tree->isSortingEnabled();
+        m_tree->setSortingEnabled(false);
         const QVector<QTreeWidgetItem*> noted = topLevelRows();
         QHash<quint32, QVector<QTreeWidgetItem*>> rowsById;
         for (QTreeWidgetItem* row : noted)
@@ -119,6 +123,7 @@ protected:
             if (!listed.contains(rowId(row)))
                 markGone(row, ProcessColumn);
         }
+        m_tree->setSortingEnabled(sorting);
         return Poll::Merged;
     }
 
@@ -150,16 +155,18 @@ private:
     static quint32 rowId(const QTreeWidgetItem* row);
     static QVector<QTreeWidgetItem*> childRows(const QTreeWidgetItem* row);
     QVector<QTreeWidgetItem*> topLevelRows() const;
-    QTreeWidgetItem* newProcessRow(const QString& name, quint32 id) const;
-    static QTreeWidgetItem* newEntryRow(quint32 id);
+    QTreeWidgetItem* newProcessRow(const QString& name, quint32 id);
+    QTreeWidgetItem* newEntryRow(quint32 id);
     void addProcessRow(QTreeWidgetItem* row);
-    static void markGone(QTreeWidgetItem* row, int column);
-    // One aging pass over the tree; true while some row is still counting its ticks.
+    void markGone(QTreeWidgetItem* row, int column);
+    // One aging pass over the rows that count their ticks; true while some still do.
     bool ageRows();
 
     QTreeWidget* m_tree = nullptr;
     int m_processIdColumn = -1;
     bool m_agingPending = false;
+    // The rows that are new or gone, so that an aging pass need not walk the whole tree.
+    QVector<QTreeWidgetItem*> m_counting;
     QSharedPointer<_ZantDevice> m_device;
     TickPacer m_pacer{0, IdleCapMs};
     // Last, so the worker is stopped before anything it reports to goes.

@@ -40,6 +40,8 @@ using namespace PageBenchDevice;
 
 namespace {
 
+const QString StillId = QStringLiteral("still");
+
 QTextStream& out()
 {
     static QTextStream stream(stdout);
@@ -95,11 +97,11 @@ double otherCpuMs(qint64 pid)
 class Served
 {
 public:
-    Served(const QString& image, const QString& sockets)
+    Served(const QString& image, const QString& id, const QString& sockets)
     {
-        m_server.start(simulatorPath(), {QStringLiteral("--image"), image, QStringLiteral("--id"), DeviceId,
+        m_server.start(simulatorPath(), {QStringLiteral("--image"), image, QStringLiteral("--id"), id,
                                          QStringLiteral("--socket-dir"), sockets});
-        m_device = connectDevice();
+        m_device = connectDevice(id);
     }
     ~Served()
     {
@@ -134,7 +136,7 @@ void measureChurn(const QString& name, LiveTreePage* page, QTreeWidget* tree, in
             ready.quit();
     });
     ready.exec();
-    runFor(3000); // the first merge's rows have aged
+    runFor(5000); // the first merge's rows have aged
 
     QVector<qint64> gaps;
     qint64 longestTick = 0;
@@ -251,7 +253,7 @@ int main(int argc, char** argv)
                  .arg(shape.processes).arg(shape.threads).arg(shape.loadedModules).arg(churn);
 
     {
-        const Served served(changing, sockets);
+        const Served served(changing, DeviceId, sockets);
         if (!served.device()) {
             std::fprintf(stderr, "the simulator did not answer\n");
             return 1;
@@ -273,14 +275,14 @@ int main(int argc, char** argv)
                                       &LoadedModuleInfo::modules);
     }
     {
-        const Served served(still, sockets);
+        const Served served(still, StillId, sockets);
         if (!served.device()) {
             std::fprintf(stderr, "the simulator did not answer\n");
             return 1;
         }
         DeviceWindow window;
         window.setAttribute(Qt::WA_DeleteOnClose, false);
-        window.setDevice(DeviceId);
+        window.setDevice(StillId);
         window.show();
         window._actionThreads->trigger();
         runFor(10000); // every page's first work is done, the tick has backed off

@@ -10,7 +10,6 @@
 #include <QSignalSpy>
 #include <QTemporaryDir>
 
-#include <functional>
 #include <memory>
 
 using namespace PageFixtures;
@@ -19,38 +18,28 @@ namespace {
 
 using Page = LiveTreePage;
 
-const QByteArray Still = "<processes evolve=\"no\" interval=\"100\">\n"
-                         " <process name=\"Kernel\"><thread name=\"idle\" priority=\"0\" state=\"1\"/>\n"
-                         "  <thread name=\"odd\" priority=\"5\" state=\"7\"/>\n"
-                         "  <module name=\"k.bin\" location=\"/sys/k.bin\" size=\"0\"/></process>\n"
-                         "</processes>\n";
-// Shell's threads come and go, and its viewer is loaded and unloaded, every 150 ms.
-const QByteArray Evolving = "<processes evolve=\"yes\" seed=\"5\" interval=\"150\" max=\"1\">\n"
-                            " <process name=\"Shell\"><thread name=\"ui\" priority=\"160\" state=\"1\"/>\n"
-                            "  <module name=\"shell.mod\" location=\"/sys/shell.mod\" size=\"14336\"/>\n"
-                            "  <module name=\"viewer.mod\" location=\"/sys/viewer.mod\" size=\"8192\" onDemand=\"yes\"/>\n"
-                            " </process>\n"
-                            "</processes>\n";
-const QByteArray Empty = "<processes evolve=\"no\"/>\n";
+// Kernel stays; /usermod/app/app.mod can be run. On "evolving", Shell's threads come and go,
+// and its viewer is loaded and unloaded, every 150 ms.
+const QByteArray Still = "<processes evolve='no' interval='100'><process name='Kernel'>"
+                         "<thread name='idle' priority='0' state='1'/><thread name='odd' priority='5' state='7'/>"
+                         "<module name='k.bin' location='/sys/k.bin' size='0'/></process></processes>";
+const QByteArray Evolving = "<processes evolve='yes' seed='5' interval='150' max='1'><process name='Shell'>"
+                            "<thread name='ui' priority='160' state='1'/><module name='shell.mod' location='/sys/shell.mod'"
+                            " size='14336'/><module name='viewer.mod' location='/sys/viewer.mod' size='8192' onDemand='yes'/>"
+                            "</process></processes>";
 
-// An image with the given processes and a runnable module /usermod/app/app.mod.
 bool writeImage(const QString& folder, const QByteArray& processes)
 {
-    const QDir image(folder);
-    return TestSupport::writeFile(image.filePath("device.xml"),
-                                  "<device id=\"live\" name=\"Live\" connection=\"simulator\">\n"
-                                  " <identity phoneName=\"Live\" targetId=\"0x0A110042\" zantVersion=\"3.2.9\"/>\n"
-                                  + processes
-                                  + " <volume id=\"1\" name=\"Flash\" mount=\"/\" folder=\"flash\" size=\"16777216\" modules=\"usermod\"/>\n"
-                                    "</device>\n")
-        && TestSupport::writeFile(image.filePath("flash/usermod/app/app.mod"), "module");
+    return TestSupport::writeFile(folder + "/device.xml",
+                                  "<device id='live' name='Live' connection='simulator'><identity phoneName='Live'"
+                                  " targetId='0x0A110042' zantVersion='3.2.9'/>" + processes
+                                  + "<volume id='1' name='Flash' mount='/' folder='flash' size='16777216'/></device>")
+        && TestSupport::writeFile(folder + "/flash/usermod/app/app.mod", "module");
 }
 
 std::unique_ptr<Page> makePage(bool threads)
 {
-    if (threads)
-        return std::make_unique<ProcessView>();
-    return std::make_unique<LoadedModuleView>();
+    return threads ? std::unique_ptr<Page>(new ProcessView) : std::unique_ptr<Page>(new LoadedModuleView);
 }
 
 QTreeWidget* treeOf(Page& page)
@@ -61,18 +50,13 @@ QTreeWidget* treeOf(Page& page)
 // A row's life as one text: its state, its age while it counts, and its colour.
 QString life(const QTreeWidgetItem* row)
 {
-    const int column = row->type() == Page::ProcessType ? Page::ProcessColumn : Page::EntryColumn;
-    const QColor colour = row->foreground(column).color();
-    const QString colourName = colour == QColor(Qt::darkGreen) ? "green" : colour == QColor(Qt::red) ? "red"
-                                                                   : colour == QColor(Qt::black) ? "black" : colour.name();
+    const QColor colour = row->foreground(row->type() == Page::ProcessType ? Page::ProcessColumn : Page::EntryColumn).color();
+    const QString name = colour == Qt::darkGreen ? "green" : colour == Qt::red ? "red" : colour == Qt::black ? "black" : colour.name();
     const int state = row->data(0, Page::StateRole).toInt();
-    if (state == Page::Shown)
-        return "shown " + colourName;
-    return (state == Page::New ? "new " : state == Page::Gone ? "gone " : "state? ")
-        + row->data(0, Page::AgeRole).toString() + " " + colourName;
+    const QString age = state == Page::Shown ? QString() : row->data(0, Page::AgeRole).toString() + " ";
+    return QStringList({"?", "shown", "new", "gone"}).value(state) + " " + age + name;
 }
 
-// The lives of every row, depth-first.
 QStringList lives(QTreeWidget* tree)
 {
     QStringList all;
@@ -81,9 +65,9 @@ QStringList lives(QTreeWidget* tree)
     return all;
 }
 
-QList<QTreeWidgetItem*> rowsNamed(QTreeWidget* tree, int column, const QString& name)
+QList<QTreeWidgetItem*> appRows(QTreeWidget* tree)
 {
-    return tree->findItems(name, Qt::MatchExactly | Qt::MatchRecursive, column);
+    return tree->findItems("app", Qt::MatchExactly, ProcessView::ProcessNameColumn);
 }
 
 void tick(Page& page, int times)
@@ -92,49 +76,32 @@ void tick(Page& page, int times)
         page.onTimeElapse();
 }
 
-// Ticks a gone row to its end by hand: it stays up to its fifth tick and goes at the sixth.
-// The row is looked up again by id after every tick, as a tick may delete it.
+// Ticks a gone row by hand: it is still there at its fifth tick and gone at the sixth.
 bool ticksToRemoval(Page& page, QTreeWidgetItem* row)
 {
-    QTreeWidget* tree = treeOf(page);
-    const QVariant id = row->data(0, Page::IdRole);
-    const int type = row->type();
-    const auto present = [&] {
-        for (QTreeWidgetItemIterator it(tree); *it; ++it) {
-            if ((*it)->type() == type && (*it)->data(0, Page::IdRole) == id && (*it)->data(0, Page::StateRole) == Page::Gone)
-                return *it;
-        }
-        return static_cast<QTreeWidgetItem*>(nullptr);
-    };
     tick(page, Page::AgingTicks - row->data(0, Page::AgeRole).toInt());
-    QTreeWidgetItem* last = present();
-    if (!last || last->data(0, Page::AgeRole).toInt() != Page::AgingTicks)
+    if (row->data(0, Page::AgeRole).toInt() != Page::AgingTicks)
         return false;
     page.onTimeElapse();
-    return !present();
-}
-
-struct Thread
-{
-    quint32 id;
-    quint32 state;
-};
-
-QVector<ProcessInfo> processes(const QVector<QPair<quint32, QVector<Thread>>>& list, const QString& name = "p")
-{
-    QVector<ProcessInfo> result;
-    for (const auto& process : list) {
-        ProcessInfo info{name, process.first, {}};
-        for (const Thread& thread : process.second)
-            info.threads.append(ThreadEntry{name + QString::number(thread.id), thread.id, 100, thread.state, process.first, 0});
-        result.append(info);
+    for (QTreeWidgetItemIterator it(treeOf(page)); *it; ++it) {
+        if (*it == row)
+            return false;
     }
-    return result;
+    return true;
 }
 
-int threadCount()
+// Two processes, the first with two threads, and the same with one change.
+QVector<ProcessInfo> changed(int change)
 {
-    return QDir("/proc/self/task").entryList(QDir::Dirs | QDir::NoDotAndDotDot).size();
+    QVector<ProcessInfo> list{{"p", 10, {{"a", 11, 100, 1, 10, 0}, {"b", 12, 100, 2, 10, 0}}}, {"q", 20, {}}};
+    switch (change) {
+    case 1: list[0].threads[0].state = 3; list[0].threads[1].name = "c"; list[1].name = "r"; break;
+    case 2: list[0].threads[1].id = 13; break;
+    case 3: list[1].id = 21; break;
+    case 4: list[1].threads.append({"d", 21, 100, 1, 20, 0}); break;
+    case 5: list.removeLast(); break;
+    }
+    return list;
 }
 
 } // namespace
@@ -151,9 +118,8 @@ private slots:
     {
         qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_sockets.path()));
         QVERIFY(Portlex::Initialize());
-        for (const auto& [folder, processes] : {std::pair{&m_stillImage, Still}, {&m_evolvingImage, Evolving},
-                                                {&m_emptyImage, Empty}})
-            QVERIFY(writeImage(folder->path(), processes));
+        QVERIFY(writeImage(m_stillImage.path(), Still) && writeImage(m_evolvingImage.path(), Evolving)
+                && writeImage(m_emptyImage.path(), "<processes evolve='no'/>"));
         m_device = m_still.connectDevice(m_stillImage.path(), "still", {"--run-lifetime", "2500"});
         QVERIFY(m_device);
         QVERIFY(m_evolving.connectDevice(m_evolvingImage.path(), "evolving"));
@@ -171,32 +137,29 @@ private slots:
     // process id, thread id or count is a change.
     void listsCompareByIds_data()
     {
-        QTest::addColumn<QVector<ProcessInfo>>("fresh");
+        QTest::addColumn<int>("change");
         QTest::addColumn<bool>("same");
-        QTest::newRow("identical") << processes({{10, {{11, 1}, {12, 2}}}, {20, {}}}) << true;
-        QTest::newRow("thread state and names") << processes({{10, {{11, 3}, {12, 0}}}, {20, {}}}, "q") << true;
-        QTest::newRow("thread id") << processes({{10, {{11, 1}, {13, 2}}}, {20, {}}}) << false;
-        QTest::newRow("process id") << processes({{10, {{11, 1}, {12, 2}}}, {21, {}}}) << false;
-        QTest::newRow("thread more") << processes({{10, {{11, 1}, {12, 2}}}, {20, {{21, 1}}}}) << false;
-        QTest::newRow("process less") << processes({{10, {{11, 1}, {12, 2}}}}) << false;
+        QTest::newRow("none") << 0 << true;
+        QTest::newRow("states and names") << 1 << true;
+        QTest::newRow("thread id") << 2 << false;
+        QTest::newRow("process id") << 3 << false;
+        QTest::newRow("thread added") << 4 << false;
+        QTest::newRow("process gone") << 5 << false;
     }
 
     void listsCompareByIds()
     {
-        QFETCH(QVector<ProcessInfo>, fresh);
+        QFETCH(int, change);
         QFETCH(bool, same);
-        const QVector<ProcessInfo> held = processes({{10, {{11, 1}, {12, 2}}}, {20, {}}});
-        QCOMPARE(sameIds(held, fresh, &ProcessInfo::threads), same);
         LiveSnapshot<ProcessInfo> snapshot;
         const auto byIds = [](const QVector<ProcessInfo>& a, const QVector<ProcessInfo>& b) {
             return sameIds(a, b, &ProcessInfo::threads);
         };
-        QVERIFY(snapshot.offer(held, byIds));
         QVector<ProcessInfo> taken;
-        QVERIFY(snapshot.take(taken) && !snapshot.take(taken));
-        QCOMPARE(snapshot.offer(fresh, byIds), !same);
+        QVERIFY(snapshot.offer(changed(0), byIds) && snapshot.take(taken) && !snapshot.take(taken));
+        QCOMPARE(snapshot.offer(changed(change), byIds), !same);
         QCOMPARE(snapshot.take(taken), !same);
-        QCOMPARE(taken, same ? held : fresh);
+        QCOMPARE(taken, changed(same ? 0 : change));
     }
 
     // New rows are green for five ticks and black at the sixth; two pages of one device age
@@ -223,24 +186,19 @@ private slots:
         QCOMPARE(page.state(), GatewayComponentWidget::Complete);
 
         QCOMPARE(m_device->RunApplication("/usermod/app/app.mod"), 0);
-        QTRY_VERIFY(!rowsNamed(page._processTree, ProcessView::ProcessNameColumn, "app").isEmpty());
-        QTreeWidgetItem* first = rowsNamed(page._processTree, ProcessView::ProcessNameColumn, "app").first();
-        QVERIFY(life(first).startsWith("new"));
-        QStringList threads;
-        for (int i = 0; i < first->childCount(); ++i)
-            threads << first->child(i)->text(ProcessView::ThreadNameColumn) + " " + life(first->child(i)).section(' ', 0, 0);
-        QCOMPARE(threads, QStringList({"app::Main new", "app::UI new", "app::Timer new"}));
-
-        QTRY_VERIFY_WITH_TIMEOUT(life(first).startsWith("gone"), 10000);
+        QTRY_COMPARE(appRows(page._processTree).size(), 1);
+        QTreeWidgetItem* first = appRows(page._processTree).first();
         QCOMPARE(first->childCount(), 3);
+        QCOMPARE(QStringList({first->child(0)->text(1), first->child(2)->text(1), life(first).left(3), life(first->child(1)).left(3)}),
+                 QStringList({"app::Main", "app::Timer", "new", "new"}));
+        QTRY_VERIFY_WITH_TIMEOUT(life(first).startsWith("gone"), 10000);
         QCOMPARE(m_device->RunApplication("/usermod/app/app.mod"), 0);
-        QTRY_COMPARE(rowsNamed(page._processTree, ProcessView::ProcessNameColumn, "app").size(), 2);
-        const QList<QTreeWidgetItem*> runs = rowsNamed(page._processTree, ProcessView::ProcessNameColumn, "app");
-        QTreeWidgetItem* second = runs.at(runs.first() == first ? 1 : 0);
+        QTRY_COMPARE(appRows(page._processTree).size(), 2);
+        QTreeWidgetItem* second = appRows(page._processTree).at(appRows(page._processTree).first() == first ? 1 : 0);
         QVERIFY(second->text(ProcessView::IdColumn).toUInt() > first->text(ProcessView::IdColumn).toUInt());
         QVERIFY(life(second).startsWith("new") && life(first).startsWith("gone"));
         QVERIFY(ticksToRemoval(page, first));
-        QCOMPARE(rowsNamed(page._processTree, ProcessView::ProcessNameColumn, "app"), QList<QTreeWidgetItem*>({second}));
+        QCOMPARE(appRows(page._processTree), QList<QTreeWidgetItem*>({second}));
     }
 
     // Threads and modules of a running process come and go: a new one is green, a vanished one
@@ -260,27 +218,24 @@ private slots:
         QTreeWidget* tree = treeOf(*page);
         QVERIFY(tickUntil(*page, [&] { return tree->topLevelItemCount() == 1; }));
         QTreeWidgetItem* shell = tree->topLevelItem(0);
-        quint32 highest = 0;
-        for (int i = 0; i < shell->childCount(); ++i)
-            highest = std::max(highest, shell->child(i)->data(0, Page::IdRole).toUInt());
-        const auto find = [&](const std::function<bool(QTreeWidgetItem*)>& match) {
+        const quint32 highest = shell->child(shell->childCount() - 1)->data(0, Page::IdRole).toUInt();
+        const auto find = [shell](auto match) {
             for (int i = 0; i < shell->childCount(); ++i) {
                 if (match(shell->child(i)))
                     return shell->child(i);
             }
             return static_cast<QTreeWidgetItem*>(nullptr);
         };
-        QTRY_VERIFY_WITH_TIMEOUT(find([&](QTreeWidgetItem* row) { return row->data(0, Page::IdRole).toUInt() > highest; }), 15000);
-        const QTreeWidgetItem* added = find([&](QTreeWidgetItem* row) { return row->data(0, Page::IdRole).toUInt() > highest; });
+        const auto isNew = [highest](QTreeWidgetItem* row) { return row->data(0, Page::IdRole).toUInt() > highest; };
+        const auto isGone = [](QTreeWidgetItem* row) { return life(row).startsWith("gone"); };
+        QTRY_VERIFY_WITH_TIMEOUT(find(isNew), 15000);
+        const QTreeWidgetItem* added = find(isNew);
         QVERIFY2(life(added).startsWith("new") && life(added).endsWith("green"), qPrintable(life(added)));
-        QCOMPARE(added->text(1), threads ? QString("ui worker") : QString("viewer.mod"));
-        if (!threads)
-            QCOMPARE(QStringList({added->text(2), added->text(3)}), QStringList({"8192", "/sys/viewer.mod"}));
-
-        QTRY_VERIFY_WITH_TIMEOUT(find([](QTreeWidgetItem* row) { return life(row).startsWith("gone"); }), 15000);
-        QTreeWidgetItem* gone = find([](QTreeWidgetItem* row) { return life(row).startsWith("gone"); });
-        QVERIFY2(life(gone).endsWith("red"), qPrintable(life(gone)));
-        QVERIFY(ticksToRemoval(*page, gone));
+        QCOMPARE(QStringList({added->text(1), added->text(2), added->text(3)}),
+                 threads ? QStringList({"ui worker", added->text(2), "Default"}) : QStringList({"viewer.mod", "8192", "/sys/viewer.mod"}));
+        QTRY_VERIFY_WITH_TIMEOUT(find(isGone), 15000);
+        QVERIFY2(life(find(isGone)).endsWith("red"), qPrintable(life(find(isGone))));
+        QVERIFY(ticksToRemoval(*page, find(isGone)));
     }
 
     // The statuses a page ends at, and whether its worker still polls: an empty device is
@@ -294,7 +249,6 @@ private slots:
         QTest::addColumn<GatewayComponentWidget::ComponentState>("state");
         QTest::addColumn<bool>("polling");
         QTest::newRow("empty device") << true << "empty" << "Ready" << GatewayComponentWidget::Complete << true;
-        QTest::newRow("empty device, modules") << false << "empty" << "Ready" << GatewayComponentWidget::Complete << true;
         QTest::newRow("failing threads") << true << "failing" << "Error: 5" << GatewayComponentWidget::Failed << false;
         QTest::newRow("failing modules") << false << "failing" << "Error: 7" << GatewayComponentWidget::Failed << false;
         QTest::newRow("unknown device") << true << "nowhere" << "Device not found" << GatewayComponentWidget::Starting << false;
@@ -317,20 +271,6 @@ private slots:
         QCOMPARE(page->isPolling(), polling);
         QCOMPARE(treeOf(*page)->topLevelItemCount(), 0);
         QVERIFY(!signalTexts(statuses).filter("Updating").size());
-    }
-
-    // A page closed while its poll hangs on a stopped device: the close returns, and the
-    // worker, once its call has timed out, ends without reporting to the page that is gone.
-    void closedWhilePollHangs()
-    {
-        const int threads = threadCount();
-        auto page = std::make_unique<ProcessView>();
-        m_empty.pause();
-        page->startComponent("empty");
-        QTRY_COMPARE(page->status(), QString("Querying Device Processes"));
-        page.reset();
-        m_empty.resume();
-        QTRY_COMPARE_WITH_TIMEOUT(threadCount(), threads, 15000);
     }
 
 private:
