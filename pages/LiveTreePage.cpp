@@ -7,6 +7,8 @@
 
 namespace {
 
+constexpr int ProcessColumnWidth = 200;
+
 enum class Aged
 {
     Kept,
@@ -67,6 +69,8 @@ void LiveTreePage::setTree(QTreeWidget* tree, int processIdColumn)
     m_tree = tree;
     m_processIdColumn = processIdColumn;
     m_tree->sortByColumn(ProcessColumn, Qt::AscendingOrder);
+    // Wide enough for a process name beside the branch marks.
+    m_tree->setColumnWidth(ProcessColumn, ProcessColumnWidth);
 }
 
 void LiveTreePage::startComponent(const QString& deviceId)
