@@ -169,6 +169,8 @@ QTreeWidgetItem* LiveTreePage::newProcessRow(const QString& name, quint32 id)
 QTreeWidgetItem* LiveTreePage::newEntryRow(quint32 id)
 {
     auto* row = new CITreeWidgetItem(EntryType);
+    // Said outright, it spares the view a look for children at every layout of the tree.
+    row->setFlags(row->flags() | Qt::ItemNeverHasChildren);
     startLife(row, id, EntryColumn);
     m_counting.append(row);
     return row;
