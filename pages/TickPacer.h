@@ -9,8 +9,8 @@
 // The single-shot tick of a page: the first tick after a page-specific delay, then backing
 // off by IdleStep up to a page-specific cap while there is nothing to show, and re-armed at
 // a short interval (0 or 1 ms) while records are waiting. One timer per page, so a re-arm
-// replaces the pending tick instead of adding a second one. Every arm is announced by
-// armed(), which lets the pacing be checked without waiting for it.
+// replaces the pending tick instead of adding a second one (only armExtra adds one). Every
+// arm is announced by armed(), which lets the pacing be checked without waiting for it.
 // Busy ticks keep their rate: a timer wakes up to a millisecond late and a tick takes time
 // itself, which would stretch "one record per millisecond" by a third; so each busy tick is
 // due one interval after the previous one was due, and a late tick makes the next come
