@@ -8,14 +8,23 @@ TickPacer::TickPacer(int initialInterval, int idleCap, QObject* parent)
     , m_idleCap(idleCap)
 {
     m_timer.setSingleShot(true);
+    m_extra.setSingleShot(true);
     m_clock.start();
     connect(&m_timer, &QTimer::timeout, this, &TickPacer::timeout);
+    connect(&m_extra, &QTimer::timeout, this, &TickPacer::timeout);
 }
 
 int TickPacer::armFirst(int delayMs)
 {
     m_busyRun = false;
     return arm(delayMs);
+}
+
+int TickPacer::armExtra(int delayMs)
+{
+    m_extra.start(delayMs);
+    emit armed(delayMs);
+    return delayMs;
 }
 
 int TickPacer::armIdle()
@@ -59,6 +68,7 @@ void TickPacer::stop()
 {
     m_busyRun = false;
     m_timer.stop();
+    m_extra.stop();
 }
 
 bool TickPacer::isArmed() const

@@ -46,6 +46,7 @@ struct ProcessEvolutionSpec
     quint32 seed = 1;
     int intervalMs = 2000;
     int maxProcesses = 16;
+    int changesPerStep = 1; // processes whose threads or modules change in one step
 };
 
 struct PlatformClassSpec

@@ -209,6 +209,9 @@ bool DeviceProfileParser::readProcesses(const QDomElement& e, DeviceProfile& pro
     if (!readNumber(e, QStringLiteral("max"), 100000, value))
         return false;
     ev.maxProcesses = e.hasAttribute(QStringLiteral("max")) ? int(value) : 16;
+    if (!readNumber(e, QStringLiteral("changes"), 100000, value))
+        return false;
+    ev.changesPerStep = e.hasAttribute(QStringLiteral("changes")) ? int(value) : 1;
 
     for (QDomElement p = e.firstChildElement(); !p.isNull(); p = p.nextSiblingElement()) {
         ProcessSpec process;

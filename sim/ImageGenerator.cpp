@@ -108,7 +108,8 @@ MifMimeType mimeRecord(int j, const ImageGenerator::Counts& counts)
 bool ImageGenerator::generate(const QString& imageDir, const Counts& counts)
 {
     if (counts.modules < 0 || counts.classes < 0 || counts.files < 0 || counts.processes < 0 || counts.mimeTypes < -1
-        || counts.settings < 0) {
+        || counts.settings < 0 || counts.threads < 0 || counts.loadedModules < 0 || counts.churn < -1
+        || counts.churn > 100) {
         m_error = QStringLiteral("counts must not be negative");
         return false;
     }
@@ -176,22 +177,35 @@ bool ImageGenerator::writeProfile(const QString& imageDir, const Counts& counts)
     w.writeEndElement();
 
     w.writeStartElement(QStringLiteral("processes"));
-    w.writeAttribute(QStringLiteral("evolve"), QStringLiteral("yes"));
+    w.writeAttribute(QStringLiteral("evolve"), counts.churn == 0 ? QStringLiteral("no") : QStringLiteral("yes"));
     w.writeAttribute(QStringLiteral("seed"), QStringLiteral("7"));
     w.writeAttribute(QStringLiteral("max"), QString::number(counts.processes + 8));
+    if (counts.churn >= 0) {
+        w.writeAttribute(QStringLiteral("interval"), QStringLiteral("1000"));
+        w.writeAttribute(QStringLiteral("changes"), QString::number(std::max(1, counts.processes * counts.churn / 100)));
+    }
+    const auto writeModule = [&w](const QString& name, bool onDemand) {
+        w.writeEmptyElement(QStringLiteral("module"));
+        w.writeAttribute(QStringLiteral("name"), name);
+        w.writeAttribute(QStringLiteral("location"), QStringLiteral("/usermod"));
+        w.writeAttribute(QStringLiteral("size"), QStringLiteral("256"));
+        if (onDemand)
+            w.writeAttribute(QStringLiteral("onDemand"), QStringLiteral("yes"));
+    };
     for (int p = 0; p < counts.processes; ++p) {
         w.writeStartElement(QStringLiteral("process"));
         w.writeAttribute(QStringLiteral("name"), QStringLiteral("proc%1").arg(p));
-        for (int t = 0; t < 2; ++t) {
+        for (int t = 0; t < counts.threads; ++t) {
             w.writeEmptyElement(QStringLiteral("thread"));
             w.writeAttribute(QStringLiteral("name"), QStringLiteral("thread%1").arg(t));
             w.writeAttribute(QStringLiteral("priority"), QString::number(100 + t));
-            w.writeAttribute(QStringLiteral("state"), QString::number(t));
+            w.writeAttribute(QStringLiteral("state"), QString::number(t % 4));
         }
-        w.writeEmptyElement(QStringLiteral("module"));
-        w.writeAttribute(QStringLiteral("name"), QStringLiteral("proc%1.mod").arg(p));
-        w.writeAttribute(QStringLiteral("location"), QStringLiteral("/usermod"));
-        w.writeAttribute(QStringLiteral("size"), QStringLiteral("256"));
+        for (int m = 0; m < counts.loadedModules; ++m)
+            writeModule(m == 0 ? QStringLiteral("proc%1.mod").arg(p) : QStringLiteral("proc%1-%2.lib").arg(p).arg(m), false);
+        // Modules that a changing process loads and unloads.
+        for (int m = 0; counts.churn > 0 && m < 2; ++m)
+            writeModule(QStringLiteral("proc%1-plugin%2.lib").arg(p).arg(m), true);
         w.writeEndElement();
     }
     w.writeEndElement();

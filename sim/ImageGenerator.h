@@ -4,8 +4,9 @@
 
 // Writes a large synthetic device image for benchmarks and load tests: N modules with
 // MIFs below usermod/, N classes spread over them, N MIME records in those MIFs (the
-// registry), N files in one folder (/shared/bulk), N resident processes and a settings
-// store of N nodes. The same counts always give the same image.
+// registry), N files in one folder (/shared/bulk), N resident processes (with N threads and
+// N loaded modules each, a given share of them changing every second) and a settings store
+// of N nodes. The same counts always give the same image.
 class ImageGenerator
 {
 public:
@@ -19,6 +20,12 @@ public:
         int mimeTypes = -1;
         // Nodes of the settings store; it always holds the five named branches.
         int settings = 0;
+        // Threads and loaded modules of every process.
+        int threads = 2;
+        int loadedModules = 1;
+        // Percent of the processes whose threads or modules change every second; -1 leaves
+        // the processes to the default evolution (one change every two seconds).
+        int churn = -1;
     };
 
     bool generate(const QString& imageDir, const Counts& counts);

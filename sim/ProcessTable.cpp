@@ -58,13 +58,13 @@ void ProcessTable::stepOnce()
         const ProcessSpec& spec = m_transients.at(int(m_random.bounded(quint32(m_transients.size()))));
         start(spec, spec.lifetime + int(m_random.bounded(quint32(spec.lifetime) + 1)));
     }
-    if (m_processes.isEmpty())
-        return;
-    Process& process = m_processes[int(m_random.bounded(quint32(m_processes.size())))];
-    if (m_random.bounded(2) == 0 || process.onDemand.isEmpty())
-        changeThreads(process);
-    else
-        toggleOnDemandModule(process);
+    for (int change = 0; change < m_evolution.changesPerStep && !m_processes.isEmpty(); ++change) {
+        Process& process = m_processes[int(m_random.bounded(quint32(m_processes.size())))];
+        if (m_random.bounded(2) == 0 || process.onDemand.isEmpty())
+            changeThreads(process);
+        else
+            toggleOnDemandModule(process);
+    }
 }
 
 // Starts a worker thread, or ends the oldest one the simulation started.

@@ -26,14 +26,14 @@ bool generateImage(const QString& image, int modules, int classes)
     return result == 0;
 }
 
-QSharedPointer<_ZantDevice> connectDevice()
+QSharedPointer<_ZantDevice> connectDevice(const QString& id)
 {
     QElapsedTimer waited;
     waited.start();
     while (waited.elapsed() < 120000) {
         QList<QPair<QString, QString>> devices;
         Portlex::GetDevices(devices);
-        const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(DeviceId);
+        const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(id);
         if (device)
             return Portlex::ConnectDevice(device, QString(), QString()) ? device : nullptr;
         QThread::msleep(100);

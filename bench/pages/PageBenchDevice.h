@@ -14,7 +14,7 @@ const QString DeviceId = QStringLiteral("bench");
 QString simulatorPath();
 bool generateImage(const QString& image, int modules, int classes);
 // Waits (up to two minutes, while a large image loads) for the simulator and connects it.
-QSharedPointer<_ZantDevice> connectDevice();
+QSharedPointer<_ZantDevice> connectDevice(const QString& id = DeviceId);
 long peakMemoryMb();
 
 } // namespace PageBenchDevice
