@@ -1,9 +1,11 @@
 #include "DeviceWindow.h"
 
 #include "EnsureWindowPlacementOnDesktop.h"
+#include "LockStatusWidget.h"
 #include "ModuleInfoDialog.h"
 #include "Portlex.h"
 #include "SaveXmlReport.h"
+#include "SecuritySettingsDialog.h"
 
 #include <QActionGroup>
 #include <QCloseEvent>
@@ -84,6 +86,7 @@ DeviceWindow::DeviceWindow(QWidget* parent)
     connect(actionE_xit, &QAction::triggered, this, &QWidget::close);
     connect(_toolbar, &QToolBar::actionTriggered, this, &DeviceWindow::onToolbarActionTriggered);
     connect(actionExport_to_XML, &QAction::triggered, this, &DeviceWindow::onWriteXMLFile);
+    connect(action_Security_Settings, &QAction::triggered, this, &DeviceWindow::onActionSecuritySettingsTriggered);
     _stackedWidget->setCurrentIndex(0);
 
     fillEmptySlots();
@@ -104,6 +107,9 @@ void DeviceWindow::buildStatusBar()
     m_status->setSizePolicy(QSizePolicy::Fixed, QSizePolicy::Fixed);
     m_status->setMinimumWidth(160);
     _statusBar->addWidget(m_status);
+    m_lockStatus = new LockStatusWidget(_statusBar);
+    _statusBar->addPermanentWidget(m_lockStatus);
+    connect(m_lockStatus, &QAbstractButton::released, this, &DeviceWindow::onLockStatusReleased);
 }
 
 void DeviceWindow::buildSearchBox()
@@ -168,6 +174,7 @@ void DeviceWindow::setDevice(const QString& deviceId)
     m_device = Portlex::GetDevice(deviceId);
     if (m_device) {
         restorePlacement(m_device->name);
+        m_lockStatus->setDevice(deviceId);
         _phoneInfoWidget->startComponent(deviceId);
         _phoneInfoWidget->setDeviceRecord(&m_device->cache);
         _classListView->setDeviceRecord(&m_device->cache);
@@ -273,6 +280,22 @@ void DeviceWindow::SetTimedStatus(QString statusMessage)
     m_timedStatusTimer->start();
     m_status->setText(statusMessage);
     QCoreApplication::processEvents();
+}
+
+void DeviceWindow::onLockStatusReleased()
+{
+    onActionSecuritySettingsTriggered();
+}
+
+void DeviceWindow::onActionSecuritySettingsTriggered()
+{
+    {
+        SecuritySettingsDialog dialog(this);
+        dialog.setDevice(m_deviceId);
+        dialog.exec();
+    }
+    // A lock just requested travels with this question, so the indicator shows the outcome.
+    m_lockStatus->setDevice(m_deviceId);
 }
 
 void DeviceWindow::onModuleInfoExamine(ModuleInfo displayMe)

@@ -1,0 +1,154 @@
+#include "DeviceWindow.h"
+#include "EnablementExpiry.h"
+#include "LockStatusWidget.h"
+#include "PageFixtures.h"
+#include "Portlex.h"
+#include "SecuritySettingsDialog.h"
+#include "SimulatorProcess.h"
+#include "TestImage.h"
+
+#include <QLocale>
+#include <QSettings>
+#include <QTemporaryDir>
+#include <QtTest>
+
+namespace {
+
+const QString Led = QStringLiteral(":/LockStatusWidget/Resources/%1.png");
+
+// An expiry text as the C library's ctime writes it: the day of month padded with a blank.
+QString ctimeText(const QDate& date)
+{
+    return QLocale::c().toString(date, QStringLiteral("ddd MMM "))
+        + QString::number(date.day()).rightJustified(2, ' ') + QStringLiteral(" 20:00:00 ")
+        + QString::number(date.year());
+}
+
+} // namespace
+
+// The developer enablement state: the status-bar indicator, the dialog and its "Lock", on
+// devices that a simulator serves in each mode.
+class SecuritySettingsTest : public QObject
+{
+    Q_OBJECT
+
+    QTemporaryDir m_sockets;
+
+private slots:
+    void initTestCase()
+    {
+        Q_INIT_RESOURCE(delvix);
+        QCoreApplication::setOrganizationName("Norvale");
+        QCoreApplication::setApplicationName("Delvix");
+        qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_sockets.path()));
+        Portlex::Initialize();
+    }
+
+    // The service's LED is green while 7 or more days are left, read from a ctime text.
+    void serviceLedByDaysLeft_data()
+    {
+        QTest::addColumn<QString>("expiry");
+        QTest::addColumn<QDate>("today");
+        QTest::addColumn<QString>("led");
+        const QDate today(2026, 12, 6);
+        QTest::newRow("7 days") << ctimeText(today.addDays(7)) << today << "GreenLED";
+        QTest::newRow("6 days") << ctimeText(today.addDays(6)) << today << "YellowLED";
+        QTest::newRow("expired") << ctimeText(today.addDays(-1)) << today << "YellowLED";
+        QTest::newRow("padded day, 7 days") << "Sun Sep  5 20:00:00 2010" << QDate(2010, 8, 29) << "GreenLED";
+        QTest::newRow("padded day, 6 days")
+            << "Sun Sep  5 20:00:00 2010" << QDate(2010, 8, 30) << "YellowLED";
+    }
+    void serviceLedByDaysLeft()
+    {
+        QFETCH(QString, expiry);
+        QFETCH(QDate, today);
+        QFETCH(QString, led);
+        QCOMPARE(serviceLedPicture(expiry, today), Led.arg(led));
+    }
+
+    // What the indicator and the dialog show in each mode, the dialog opened by a click on
+    // the indicator; "Lock" ends the mode it names (the service first), and the indicator
+    // shows the outcome once the dialog is closed.
+    void enablementThroughTheWindow_data()
+    {
+        QTest::addColumn<QString>("mode");
+        QTest::addColumn<QString>("expiry");
+        QTest::addColumn<QStringList>("indicator"); // text, LED, tool tip
+        QTest::addColumn<QStringList>("panel"); // mode, expiry, privilege values...
+        QTest::addColumn<QString>("afterLock");
+        const QString soon = ctimeText(QDate::currentDate().addDays(30));
+        const QString past = QStringLiteral("Sun Sep  5 20:00:00 2010");
+        const QString service = QStringLiteral("Developer Enabled Service"),
+                      sig = QStringLiteral("Developer Enabled Signature");
+        const QStringList priviledges = {"0x00000011", "0x12345678"};
+        QTest::newRow("service") << "service" << soon
+                                 << QStringList {"DES Enabled", "GreenLED", service + " expires:\n" + soon}
+                                 << QStringList {service, soon} + priviledges << "Simulator Enabled";
+        QTest::newRow("service expired")
+            << "service" << past << QStringList {"DES Enabled", "YellowLED", service + " expires:\n" + past}
+            << QStringList {service, past} + priviledges << "Simulator Enabled";
+        QTest::newRow("signature") << "signature" << soon
+                                   << QStringList {"Sig Enabled", "Globe", sig + " expires:\n" + soon}
+                                   << QStringList {sig, soon} << "Simulator Enabled";
+        QTest::newRow("both") << "both" << soon
+                              << QStringList {"Sig Enabled", "Globe", sig + " expires:\n" + soon}
+                              << QStringList {sig, soon} << "Sig Enabled";
+        QTest::newRow("none") << "none" << soon << QStringList {"Simulator Enabled", "UnlitLED", ""}
+                              << QStringList {"Disabled???", ""} << "Simulator Enabled";
+    }
+    void enablementThroughTheWindow()
+    {
+        QFETCH(QString, mode);
+        QFETCH(QString, expiry);
+        QFETCH(QStringList, indicator);
+        QFETCH(QStringList, panel);
+        QFETCH(QString, afterLock);
+        TestImage image;
+        image.fillDefault();
+        QByteArray profile = TestImage::defaultProfile();
+        profile.replace(R"(mode="service")", "mode=\"" + mode.toUtf8() + '"');
+        profile.replace("Sun Sep 19 20:00:00 2027", expiry.toUtf8());
+        image.writeProfile(profile);
+        SimulatorProcess simulator(m_sockets.path());
+        const QString id = QString(QStringLiteral("lock-") + QTest::currentDataTag()).replace(' ', '-');
+        QVERIFY(simulator.connectDevice(image.path(), id));
+
+        DeviceWindow window;
+        window.setDevice(id);
+        window.show();
+        auto* status = window.findChild<LockStatusWidget*>();
+        QCOMPARE(status->_modeStatus->text(), indicator.at(0));
+        QCOMPARE(status->_ledStatus->pixmap().toImage(),
+            QImage(Led.arg(indicator.at(1)))
+                .convertToFormat(status->_ledStatus->pixmap().toImage().format()));
+        QCOMPARE(status->toolTip(), indicator.at(2));
+
+        QStringList shown;
+        QTimer::singleShot(0, this, [&] {
+            auto* dialog = window.findChild<SecuritySettingsDialog*>();
+            const SecuritySettings* settings = dialog->_securitySettings;
+            shown << settings->_unlockModeLabel->text() << settings->_expiresLabel->text()
+                  << PageFixtures::columnTexts(settings->_priviledgeTable, 0);
+            settings->_lockButton->click();
+            dialog->okButton->click();
+        });
+        QTest::mouseClick(status->_modeStatus, Qt::LeftButton);
+        QCOMPARE(shown, panel);
+        QCOMPARE(status->_modeStatus->text(), afterLock);
+    }
+
+    // Only the first two indicators ever built show the hint cursor.
+    void hintCursorOnTheFirstTwo()
+    {
+        QSettings().remove("lockseen");
+        QList<Qt::CursorShape> shapes;
+        for (int i = 0; i < 3; ++i)
+            shapes << LockStatusWidget().cursor().shape();
+        QCOMPARE(shapes, (QList<Qt::CursorShape> {Qt::BitmapCursor, Qt::BitmapCursor, Qt::ArrowCursor}));
+    }
+
+    void cleanupTestCase() { Portlex::Destroy(); }
+};
+
+QTEST_MAIN(SecuritySettingsTest)
+#include "tst_securitysettings.moc"
