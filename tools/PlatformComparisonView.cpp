@@ -56,17 +56,24 @@ bool PlatformComparisonView::loadScan(const QString& path)
         informUser(this, tr("File Format Error"), path + tr(" is not the right format."));
         return false;
     }
-    for (const PlatformScanFile::Entry& entry : file.entries)
-        addScanEntry(column, entry.name, entry.value, entry.family, entry.subFamily);
+    addScanEntries(column, file.entries);
     return true;
 }
 
 int PlatformComparisonView::addScanColumn(const QString& header)
 {
-    m_comparison.addScan(header);
-    const int column = _comparisonTable->columnCount();
-    _comparisonTable->setColumnCount(column + 1);
-    _comparisonTable->setHorizontalHeaderItem(column, new QTableWidgetItem(header));
+    const int column = FixedColumns + m_comparison.addScan(header);
+    // A table that gains a column moves its cells once per row, which costs rows squared: a
+    // spare column is added, hidden, while the table is still empty and used by the next scan.
+    QTableWidget* table = _comparisonTable;
+    if (table->columnCount() <= column)
+        table->setColumnCount(column + 1);
+    if (table->rowCount() == 0) {
+        table->setColumnCount(column + 2);
+        table->setColumnHidden(column + 1, true);
+    }
+    table->setHorizontalHeaderItem(column, new QTableWidgetItem(header));
+    table->setColumnHidden(column, false);
     return column;
 }
 
@@ -81,6 +88,11 @@ void PlatformComparisonView::indexRows()
 void PlatformComparisonView::addScanEntry(
     int column, const QString& name, const QString& value, const QString& family, const QString& subfamily)
 {
+    addScanEntries(column, {{name, value, family, subfamily}});
+}
+
+void PlatformComparisonView::addScanEntries(int column, const QVector<PlatformScanFile::Entry>& entries)
+{
     const int scan = column - FixedColumns;
     if (scan < 0 || scan >= m_comparison.scans().size())
         return;
@@ -91,23 +103,28 @@ void PlatformComparisonView::addScanEntry(
     if (!m_rowsIndexed)
         indexRows();
 
-    bool added = false;
-    const int index = m_comparison.add(scan, name, value, family, subfamily, &added);
-    int row = -1;
-    if (added) {
-        row = table->rowCount();
-        table->insertRow(row);
+    const int known = int(m_comparison.classes().size());
+    QVector<int> marked;
+    marked.reserve(entries.size());
+    for (const PlatformScanFile::Entry& entry : entries)
+        marked.append(m_comparison.add(scan, entry.name, entry.value, entry.family, entry.subFamily));
+
+    // The new classes' rows come at once: growing the table row by row costs a model change per row.
+    int row = table->rowCount();
+    table->setRowCount(row + int(m_comparison.classes().size()) - known);
+    for (int index = known; index < m_comparison.classes().size(); ++index, ++row) {
+        const ScanComparison::Class& added = m_comparison.classes().at(index);
         int cell = 0;
-        for (const QString& text : {name, value, family, subfamily})
+        for (const QString& text : {added.name, added.id, added.family, added.subFamily})
             table->setItem(row, cell++, new CITableWidgetItem(text));
         table->item(row, IdColumn)->setData(ClassIndexRole, index);
         m_rowOfClass.append(row);
-    } else {
-        row = m_rowOfClass.at(index);
     }
-    auto* check = new QTableWidgetItem(m_checkIcon, QString());
-    check->setTextAlignment(Qt::AlignCenter);
-    table->setItem(row, column, check);
+    for (const int index : marked) {
+        auto* check = new QTableWidgetItem(m_checkIcon, QString());
+        check->setTextAlignment(Qt::AlignCenter);
+        table->setItem(m_rowOfClass.at(index), column, check);
+    }
 
     if (sorting) {
         table->setSortingEnabled(true);

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "PlatformScanFile.h"
 #include "ScanComparison.h"
 #include "ui_PlatformComparisonView.h"
 
@@ -36,6 +37,8 @@ public slots:
 
 private:
     int addScanColumn(const QString& header);
+    // Marks each entry's class present in the scan of column, the new ones in rows added at once.
+    void addScanEntries(int column, const QVector<PlatformScanFile::Entry>& entries);
     // Rows move when the table sorts: the row of each class is looked up afresh once per load.
     void indexRows();
     void refreshSummary();

@@ -3,8 +3,8 @@
 #include "IdFormat.h"
 #include "XmlReadPolicy.h"
 
-#include <QDomDocument>
 #include <QFileInfo>
+#include <QXmlStreamReader>
 
 QString PlatformScanFile::comparableId(const QString& value)
 {
@@ -20,34 +20,64 @@ QString PlatformScanFile::comparableId(const QString& value)
 PlatformScanFile PlatformScanFile::read(const QString& path)
 {
     PlatformScanFile file;
-    QDomDocument document;
+    QByteArray bytes;
     XmlReadPolicy policy(XmlReadPolicy::DatabaseFileBytes);
-    if (!policy.readFile(path, document))
+    if (!policy.readCheckedFile(path, bytes))
         return file;
 
-    const QDomElement root = document.documentElement();
-    file.header = root.elementsByTagName(QStringLiteral("ZTOVERSION"))
-                      .item(0)
-                      .toElement()
-                      .attribute(QStringLiteral("version"));
+    // Streamed, not a DOM: the entries of each kind of container below the root, kept apart
+    // since "classes" counts only in a file without "ZantHeaderDataList".
+    enum Container
+    {
+        None = -1,
+        HeaderDataList,
+        Classes
+    };
+    QVector<Entry> listed[2];
+    bool found[2] = {false, false};
+    bool versionRead = false;
+    QVector<int> open; // the container kind of each open element
+    QXmlStreamReader xml(bytes);
+    while (!xml.atEnd()) {
+        const QXmlStreamReader::TokenType token = xml.readNext();
+        if (token == QXmlStreamReader::EndElement) {
+            open.removeLast();
+            continue;
+        }
+        if (token != QXmlStreamReader::StartElement)
+            continue;
+        int kind = None;
+        if (!open.isEmpty()) {
+            const QStringView name = xml.name();
+            const QXmlStreamAttributes attributes = xml.attributes();
+            if (name == u"ZantHeaderDataList") {
+                kind = HeaderDataList;
+            } else if (name == u"classes") {
+                kind = Classes;
+            } else if (name == u"ZTOVERSION" && !versionRead) {
+                versionRead = true;
+                file.header = attributes.value(QLatin1String("version")).toString();
+            } else if (name == u"ZTOId" && open.last() != None) {
+                listed[open.last()].append({attributes.value(QLatin1String("name")).toString(),
+                    comparableId(attributes.value(QLatin1String("value")).toString()),
+                    attributes.value(QLatin1String("family")).toString(),
+                    attributes.value(QLatin1String("subfamily")).toString()});
+            }
+        }
+        if (kind != None)
+            found[kind] = true;
+        open.append(kind);
+    }
+    if (xml.hasError())
+        return file;
+
     if (file.header.isEmpty())
         file.header = QFileInfo(path).baseName();
-
-    QDomNodeList lists = root.elementsByTagName(QStringLiteral("ZantHeaderDataList"));
-    if (lists.isEmpty())
-        lists = root.elementsByTagName(QStringLiteral("classes"));
-    if (lists.isEmpty()) {
+    if (!found[HeaderDataList] && !found[Classes]) {
         file.status = WrongFormat;
         return file;
     }
     file.status = Read;
-    for (int i = 0; i < lists.size(); ++i) {
-        for (QDomElement e = lists.item(i).firstChildElement(QStringLiteral("ZTOId")); !e.isNull();
-             e = e.nextSiblingElement(QStringLiteral("ZTOId"))) {
-            file.entries.append(
-                {e.attribute(QStringLiteral("name")), comparableId(e.attribute(QStringLiteral("value"))),
-                    e.attribute(QStringLiteral("family")), e.attribute(QStringLiteral("subfamily"))});
-        }
-    }
+    file.entries = std::move(listed[found[HeaderDataList] ? HeaderDataList : Classes]);
     return file;
 }

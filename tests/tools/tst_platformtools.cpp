@@ -42,7 +42,7 @@ QStringList tableLines(const QTableWidget* table, bool all = true)
             lines << cells.join('|');
     }
     for (int column = 0; column < table->columnCount(); ++column)
-        headers << table->horizontalHeaderItem(column)->text();
+        headers << table->model()->headerData(column, Qt::Horizontal).toString();
     return lines << headers.join('|');
 }
 
