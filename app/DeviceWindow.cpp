@@ -15,6 +15,7 @@
 #include <QFileInfo>
 #include <QLabel>
 #include <QLineEdit>
+#include <QPointer>
 #include <QSettings>
 #include <QTimer>
 #include <QUrl>
@@ -289,13 +290,17 @@ void DeviceWindow::onLockStatusReleased()
 
 void DeviceWindow::onActionSecuritySettingsTriggered()
 {
-    {
-        SecuritySettingsDialog dialog(this);
-        dialog.setDevice(m_deviceId);
-        dialog.exec();
-    }
+    // Exit closes every window while the dialog runs: after it, nothing of this window is
+    // touched unless it is still there.
+    const QString deviceId = m_deviceId;
+    const QPointer<LockStatusWidget> indicator = m_lockStatus;
+    const QPointer<SecuritySettingsDialog> dialog = new SecuritySettingsDialog(this);
+    dialog->setDevice(deviceId);
+    dialog->exec();
+    delete dialog;
     // A lock just requested travels with this question, so the indicator shows the outcome.
-    m_lockStatus->setDevice(m_deviceId);
+    if (indicator)
+        indicator->setDevice(deviceId);
 }
 
 void DeviceWindow::onModuleInfoExamine(ModuleInfo displayMe)
