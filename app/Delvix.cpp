@@ -3,6 +3,7 @@
 #include "AboutDialog.h"
 #include "DeviceDirectory.h"
 #include "DeviceWindow.h"
+#include "PlatformTools.h"
 #include "Portlex.h"
 #include "SplashDialog.h"
 
@@ -224,4 +225,14 @@ void Delvix::onActionExit()
     const QWidgetList left = QApplication::topLevelWidgets();
     if (std::none_of(left.begin(), left.end(), [](const QWidget* window) { return window->isVisible(); }))
         QCoreApplication::quit();
+}
+
+void Delvix::on__actionProcess_Platform_triggered()
+{
+    scanPlatformClassIds();
+}
+
+void Delvix::on__actionCompare_Platforms_triggered()
+{
+    comparePlatformScans();
 }

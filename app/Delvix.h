@@ -27,6 +27,8 @@ private slots:
     void onTriggered(bool checked);
     void onAboutToShow();
     void onActionExit();
+    void on__actionProcess_Platform_triggered();
+    void on__actionCompare_Platforms_triggered();
 
 private:
     void createTrayIcon();

@@ -1,9 +1,11 @@
 #include "DeviceWindow.h"
 
 #include "EnsureWindowPlacementOnDesktop.h"
+#include "LockStatusWidget.h"
 #include "ModuleInfoDialog.h"
 #include "Portlex.h"
 #include "SaveXmlReport.h"
+#include "SecuritySettingsDialog.h"
 
 #include <QActionGroup>
 #include <QCloseEvent>
@@ -13,6 +15,7 @@
 #include <QFileInfo>
 #include <QLabel>
 #include <QLineEdit>
+#include <QPointer>
 #include <QSettings>
 #include <QTimer>
 #include <QUrl>
@@ -84,6 +87,7 @@ DeviceWindow::DeviceWindow(QWidget* parent)
     connect(actionE_xit, &QAction::triggered, this, &QWidget::close);
     connect(_toolbar, &QToolBar::actionTriggered, this, &DeviceWindow::onToolbarActionTriggered);
     connect(actionExport_to_XML, &QAction::triggered, this, &DeviceWindow::onWriteXMLFile);
+    connect(action_Security_Settings, &QAction::triggered, this, &DeviceWindow::onActionSecuritySettingsTriggered);
     _stackedWidget->setCurrentIndex(0);
 
     fillEmptySlots();
@@ -104,6 +108,9 @@ void DeviceWindow::buildStatusBar()
     m_status->setSizePolicy(QSizePolicy::Fixed, QSizePolicy::Fixed);
     m_status->setMinimumWidth(160);
     _statusBar->addWidget(m_status);
+    m_lockStatus = new LockStatusWidget(_statusBar);
+    _statusBar->addPermanentWidget(m_lockStatus);
+    connect(m_lockStatus, &QAbstractButton::released, this, &DeviceWindow::onLockStatusReleased);
 }
 
 void DeviceWindow::buildSearchBox()
@@ -168,6 +175,7 @@ void DeviceWindow::setDevice(const QString& deviceId)
     m_device = Portlex::GetDevice(deviceId);
     if (m_device) {
         restorePlacement(m_device->name);
+        m_lockStatus->setDevice(deviceId);
         _phoneInfoWidget->startComponent(deviceId);
         _phoneInfoWidget->setDeviceRecord(&m_device->cache);
         _classListView->setDeviceRecord(&m_device->cache);
@@ -273,6 +281,26 @@ void DeviceWindow::SetTimedStatus(QString statusMessage)
     m_timedStatusTimer->start();
     m_status->setText(statusMessage);
     QCoreApplication::processEvents();
+}
+
+void DeviceWindow::onLockStatusReleased()
+{
+    onActionSecuritySettingsTriggered();
+}
+
+void DeviceWindow::onActionSecuritySettingsTriggered()
+{
+    // Exit closes every window while the dialog runs: after it, nothing of this window is
+    // touched unless it is still there.
+    const QString deviceId = m_deviceId;
+    const QPointer<LockStatusWidget> indicator = m_lockStatus;
+    const QPointer<SecuritySettingsDialog> dialog = new SecuritySettingsDialog(this);
+    dialog->setDevice(deviceId);
+    dialog->exec();
+    delete dialog;
+    // A lock just requested travels with this question, so the indicator shows the outcome.
+    if (indicator)
+        indicator->setDevice(deviceId);
 }
 
 void DeviceWindow::onModuleInfoExamine(ModuleInfo displayMe)

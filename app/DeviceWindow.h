@@ -7,6 +7,7 @@
 #include <QMainWindow>
 #include <QSharedPointer>
 
+class LockStatusWidget;
 class QLabel;
 class QLineEdit;
 class QTimer;
@@ -39,6 +40,8 @@ public slots:
     void onComponentStateChange(GatewayComponentWidget::ComponentState state);
     void onSearch(QString searchChars);
     void onToolbarActionTriggered(QAction* triggerAction);
+    void onLockStatusReleased();
+    void onActionSecuritySettingsTriggered();
     void onModuleInfoExamine(ModuleInfo displayMe);
     void onTimedStatusExpire();
     void onWriteXMLFile();
@@ -59,6 +62,7 @@ private:
     QSharedPointer<_ZantDevice> m_device;
     GatewayComponentWidget* m_currentPage = nullptr;
     QLabel* m_status = nullptr;
+    LockStatusWidget* m_lockStatus = nullptr;
     QLabel* m_searchLabel = nullptr;
     QLineEdit* m_searchBox = nullptr;
     QTimer* m_timedStatusTimer = nullptr;

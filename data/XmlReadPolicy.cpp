@@ -73,6 +73,15 @@ bool XmlReadPolicy::parse(const QByteArray& xml, const QString& source, QDomDocu
     return true;
 }
 
+bool XmlReadPolicy::readCheckedFile(const QString& path, QByteArray& xml)
+{
+    m_error.clear();
+    QFile file(path);
+    if (!file.open(QIODevice::ReadOnly))
+        return fail(QStringLiteral("cannot open %1: %2").arg(path, file.errorString()));
+    return readLimited(&file, path, xml) && check(xml, path);
+}
+
 bool XmlReadPolicy::check(const QByteArray& xml, const QString& source)
 {
     QXmlStreamReader reader(xml);

@@ -33,6 +33,9 @@ public:
     bool read(QIODevice* device, QDomDocument& document);
     // Checks and parses bytes already read; source names them in messages.
     bool parse(const QByteArray& xml, const QString& source, QDomDocument& document);
+    // Reads and checks the file without parsing it, for readers that stream it themselves
+    // (the DOM of a large file costs far more than reading it).
+    bool readCheckedFile(const QString& path, QByteArray& xml);
 
     QString errorString() const { return m_error; }
 

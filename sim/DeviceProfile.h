@@ -62,6 +62,7 @@ struct EnablementSpec
         None,
         Service,   // developer enablement service: expiry and privileges
         Signature, // global test signature
+        Both,      // the signature and the service at once
     };
     Mode mode = Mode::None;
     QString owner; // who the enablement was granted to

@@ -269,10 +269,12 @@ bool DeviceProfileParser::readEnablement(const QDomElement& e, EnablementSpec& e
         enablement.mode = EnablementSpec::Mode::Service;
     else if (mode == QLatin1String("signature"))
         enablement.mode = EnablementSpec::Mode::Signature;
+    else if (mode == QLatin1String("both"))
+        enablement.mode = EnablementSpec::Mode::Both;
     else if (mode == QLatin1String("none"))
         enablement.mode = EnablementSpec::Mode::None;
     else
-        return fail(QStringLiteral("enablement mode must be \"service\", \"signature\" or \"none\""));
+        return fail(QStringLiteral("enablement mode must be \"service\", \"signature\", \"both\" or \"none\""));
     enablement.owner = e.attribute(QStringLiteral("owner"));
     enablement.expires = e.attribute(QStringLiteral("expires"));
     for (QDomElement p = e.firstChildElement(QStringLiteral("priviledge")); !p.isNull();

@@ -313,9 +313,21 @@ QString DeviceState::attributesOf(const DirectoryListing::Entry& file, bool syst
     return text;
 }
 
+bool DeviceState::serviceEnabled() const
+{
+    const EnablementSpec::Mode mode = m_profile.enablement.mode;
+    return (mode == EnablementSpec::Mode::Service || mode == EnablementSpec::Mode::Both) && !m_serviceLocked;
+}
+
+bool DeviceState::signatureEnabled() const
+{
+    const EnablementSpec::Mode mode = m_profile.enablement.mode;
+    return (mode == EnablementSpec::Mode::Signature || mode == EnablementSpec::Mode::Both) && !m_signatureLocked;
+}
+
 EnablementStatus DeviceState::tepStatus(QString& mode, QString& owner, QString& expires) const
 {
-    if (m_profile.enablement.mode != EnablementSpec::Mode::Service || m_serviceLocked)
+    if (!serviceEnabled())
         return EnablementDisabled;
     mode = QStringLiteral("Developer Enabled Service");
     owner = m_profile.enablement.owner;
@@ -325,7 +337,7 @@ EnablementStatus DeviceState::tepStatus(QString& mode, QString& owner, QString& 
 
 EnablementStatus DeviceState::globalTestSigStatus(QString& mode, QString& owner, QString& expires) const
 {
-    if (m_profile.enablement.mode != EnablementSpec::Mode::Signature || m_signatureLocked)
+    if (!signatureEnabled())
         return EnablementDisabled;
     mode = QStringLiteral("Developer Enabled Signature");
     owner = m_profile.enablement.owner;
@@ -336,7 +348,7 @@ EnablementStatus DeviceState::globalTestSigStatus(QString& mode, QString& owner,
 QVector<PriviledgeRecord> DeviceState::tepPriviledges() const
 {
     QVector<PriviledgeRecord> list;
-    if (m_profile.enablement.mode != EnablementSpec::Mode::Service || m_serviceLocked)
+    if (!serviceEnabled())
         return list;
     for (const QString& id : m_profile.enablement.priviledges) {
         PriviledgeRecord record;

@@ -75,6 +75,9 @@ private:
     void advanceClock();
     quint64 usedBytes(int volume);
     bool inSystemFolder(int volume, const QString& devicePath) const;
+    // The mode is in the profile and no lock request has ended it.
+    bool serviceEnabled() const;
+    bool signatureEnabled() const;
 
     DeviceProfile m_profile;
     VolumePathResolver m_resolver;

@@ -1,0 +1,25 @@
+#pragma once
+
+#include "ui_PlatformComparisonDialog.h"
+
+#include <QDialog>
+
+// The window of a platform scan comparison: the view, "Save to File..." and "Close". It opens
+// 16 pixels right and down from where the last one was, and deletes itself when closed,
+// storing its place and size then.
+class PlatformComparisonDialog : public QDialog, public Ui::PlatformComparisonDialogClass
+{
+    Q_OBJECT
+
+public:
+    static constexpr int CascadeOffset = 16;
+
+    explicit PlatformComparisonDialog(QWidget* parent = nullptr);
+    ~PlatformComparisonDialog() override;
+
+    bool loadFile(const QString& path);
+
+public slots:
+    void OnCloseButtonClicked();
+    void OnSaveFileButtonClicked();
+};

@@ -1,0 +1,83 @@
+#include "PlatformScanFile.h"
+
+#include "IdFormat.h"
+#include "XmlReadPolicy.h"
+
+#include <QFileInfo>
+#include <QXmlStreamReader>
+
+QString PlatformScanFile::comparableId(const QString& value)
+{
+    QStringView digits = QStringView(value).trimmed();
+    if (digits.startsWith(QLatin1String("0x"), Qt::CaseInsensitive))
+        digits = digits.mid(2);
+    // Unsigned, so ids of 0x80000000 and above are brought to the same form as the others.
+    bool ok = false;
+    const uint number = digits.toUInt(&ok, 16);
+    return ok && !digits.isEmpty() && !digits.startsWith(QLatin1Char('+')) ? formatId(number) : value;
+}
+
+PlatformScanFile PlatformScanFile::read(const QString& path)
+{
+    PlatformScanFile file;
+    QByteArray bytes;
+    XmlReadPolicy policy(XmlReadPolicy::DatabaseFileBytes);
+    if (!policy.readCheckedFile(path, bytes))
+        return file;
+
+    // Streamed, not a DOM: the entries of each kind of container below the root, kept apart
+    // since "classes" counts only in a file without "ZantHeaderDataList".
+    enum Container
+    {
+        None = -1,
+        HeaderDataList,
+        Classes
+    };
+    QVector<Entry> listed[2];
+    bool found[2] = {false, false};
+    bool versionRead = false;
+    QVector<int> open; // the container kind of each open element
+    QXmlStreamReader xml(bytes);
+    while (!xml.atEnd()) {
+        const QXmlStreamReader::TokenType token = xml.readNext();
+        if (token == QXmlStreamReader::EndElement) {
+            open.removeLast();
+            continue;
+        }
+        if (token != QXmlStreamReader::StartElement)
+            continue;
+        int kind = None;
+        if (!open.isEmpty()) {
+            const QStringView name = xml.name();
+            const QXmlStreamAttributes attributes = xml.attributes();
+            if (name == u"ZantHeaderDataList") {
+                kind = HeaderDataList;
+            } else if (name == u"classes") {
+                kind = Classes;
+            } else if (name == u"ZTOVERSION" && !versionRead) {
+                versionRead = true;
+                file.header = attributes.value(QLatin1String("version")).toString();
+            } else if (name == u"ZTOId" && open.last() != None) {
+                listed[open.last()].append({attributes.value(QLatin1String("name")).toString(),
+                    comparableId(attributes.value(QLatin1String("value")).toString()),
+                    attributes.value(QLatin1String("family")).toString(),
+                    attributes.value(QLatin1String("subfamily")).toString()});
+            }
+        }
+        if (kind != None)
+            found[kind] = true;
+        open.append(kind);
+    }
+    if (xml.hasError())
+        return file;
+
+    if (file.header.isEmpty())
+        file.header = QFileInfo(path).baseName();
+    if (!found[HeaderDataList] && !found[Classes]) {
+        file.status = WrongFormat;
+        return file;
+    }
+    file.status = Read;
+    file.entries = std::move(listed[found[HeaderDataList] ? HeaderDataList : Classes]);
+    return file;
+}
