@@ -17,6 +17,7 @@ enum Client : int
     InvalidArgument = 1007,  // a null record was passed, or a request too large for a frame
     LocalFileError = 1008,   // the file on the PC could not be read or written
     Untrusted = 1009,        // the socket folder or the device's process is not the user's own
+    Cancelled = 1010,        // the caller's progress callback asked to stop
 };
 
 // Answered by the device side.

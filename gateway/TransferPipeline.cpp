@@ -25,6 +25,18 @@ QByteArray chunkRequest(quint32 transferId, const char* data, qint64 length)
     return request;
 }
 
+// KiB, rounded up, so that an int holds 2 TiB.
+int kib(quint64 bytes)
+{
+    return int((bytes + 1023) / 1024);
+}
+
+// Tells the callback how far the transfer is; true when it asks to stop.
+bool report(PortlexProgressCallback callback, void* context, int value, quint64 size)
+{
+    return callback && callback(context, value, kib(size), QString());
+}
+
 } // namespace
 
 TransferPipeline::TransferPipeline(DeviceConnection& connection)
@@ -32,11 +44,13 @@ TransferPipeline::TransferPipeline(DeviceConnection& connection)
 {
 }
 
-qint32 TransferPipeline::upload(quint32 transferId, QIODevice& source, quint64 size)
+qint32 TransferPipeline::upload(quint32 transferId, QIODevice& source, quint64 size, PortlexProgressCallback callback,
+                                void* context)
 {
     QByteArray buffer(int(Protocol::TransferChunkSize), Qt::Uninitialized);
     quint64 sent = 0;
-    while (sent < size) {
+    bool stop = report(callback, context, -1, size);
+    while (sent < size && !stop) {
         const qint64 wanted = qint64(std::min<quint64>(size - sent, Protocol::TransferChunkSize));
         const qint64 got = source.read(buffer.data(), wanted);
         if (got != wanted) {
@@ -54,8 +68,10 @@ qint32 TransferPipeline::upload(quint32 transferId, QIODevice& source, quint64 s
             if (result != 0)
                 return result;
         }
+        stop = report(callback, context, kib(sent), size);
     }
-    return drain(Operation::UploadChunk);
+    const qint32 pending = drain(Operation::UploadChunk);
+    return pending != 0 || !stop ? pending : qint32(PortlexError::Cancelled);
 }
 
 qint32 TransferPipeline::drain(Operation operation)
@@ -70,10 +86,13 @@ qint32 TransferPipeline::drain(Operation operation)
     return first;
 }
 
-qint32 TransferPipeline::download(quint32 transferId, QIODevice& sink, quint64 size)
+qint32 TransferPipeline::download(quint32 transferId, QIODevice& sink, quint64 size, PortlexProgressCallback callback,
+                                  void* context)
 {
     quint64 requested = 0;
     quint64 received = 0;
+    if (report(callback, context, -1, size))
+        return PortlexError::Cancelled;
     while (received < size) {
         while (requested < size && m_connection.pendingAnswers() < Window) {
             const quint32 wanted = quint32(std::min<quint64>(size - requested, Protocol::TransferChunkSize));
@@ -104,6 +123,10 @@ qint32 TransferPipeline::download(quint32 transferId, QIODevice& sink, quint64 s
             return pending != 0 ? pending : qint32(PortlexError::LocalFileError);
         }
         received += quint64(bytes.size());
+        if (report(callback, context, kib(received), size)) {
+            const qint32 pending = drain(Operation::CopyToPCChunk);
+            return pending != 0 ? pending : qint32(PortlexError::Cancelled);
+        }
     }
     return 0;
 }

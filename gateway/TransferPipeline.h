@@ -1,5 +1,6 @@
 #pragma once
 
+#include "ProgressCallback.h"
 #include "Protocol.h"
 
 #include <QtGlobal>
@@ -22,9 +23,13 @@ public:
     // Sends size bytes of source as UploadChunk requests of the transfer. A source that
     // cannot be read gives LocalFileError after every pending answer was collected, so the
     // connection stays usable for the UploadAbort that should follow.
-    qint32 upload(quint32 transferId, QIODevice& source, quint64 size);
+    // Both report to callback (see _ZantDevice::CopyFileToPC); a callback that answers
+    // true ends the transfer with Cancelled, again with no answer pending.
+    qint32 upload(quint32 transferId, QIODevice& source, quint64 size, PortlexProgressCallback callback = nullptr,
+                  void* context = nullptr);
     // Receives size bytes of the transfer into sink; fewer bytes is TransferIncomplete.
-    qint32 download(quint32 transferId, QIODevice& sink, quint64 size);
+    qint32 download(quint32 transferId, QIODevice& sink, quint64 size, PortlexProgressCallback callback = nullptr,
+                    void* context = nullptr);
 
 private:
     // Collects every pending answer; the first failure, else 0.

@@ -250,18 +250,19 @@ EnablementStatus _ZantDevice::enablement(Operation operation, QString& mode, QSt
     return EnablementStatus(status);
 }
 
-int _ZantDevice::upload(quint32 transferId, QIODevice& source)
+int _ZantDevice::upload(quint32 transferId, QIODevice& source, PortlexProgressCallback callback, void* context)
 {
     DeviceConnection& connection = ThreadConnections::forDevice(m_lifetime, socketPath());
-    const int result = TransferPipeline(connection).upload(transferId, source, quint64(source.size()));
-    if (result == PortlexError::LocalFileError) {
+    const int result = TransferPipeline(connection).upload(transferId, source, quint64(source.size()), callback, context);
+    if (result == PortlexError::LocalFileError || result == PortlexError::Cancelled) {
         QByteArray body;
         call(Operation::UploadAbort, pack(transferId), &body);
     }
     return result;
 }
 
-int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPath)
+int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPath, PortlexProgressCallback callback,
+                              void* context)
 {
     quint32 transferId = 0;
     quint64 size = 0;
@@ -271,7 +272,7 @@ int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPat
     QSaveFile sink(localPath);
     if (sink.open(QIODevice::WriteOnly)) {
         DeviceConnection& connection = ThreadConnections::forDevice(m_lifetime, socketPath());
-        result = TransferPipeline(connection).download(transferId, sink, size);
+        result = TransferPipeline(connection).download(transferId, sink, size, callback, context);
     } else {
         result = PortlexError::LocalFileError;
     }
@@ -290,7 +291,8 @@ int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPat
     return sink.commit() ? 0 : int(PortlexError::LocalFileError);
 }
 
-int _ZantDevice::CopyFileToDevice(const QString& localPath, const QString& devicePath)
+int _ZantDevice::CopyFileToDevice(const QString& localPath, const QString& devicePath, PortlexProgressCallback callback,
+                                  void* context)
 {
     QFile source(localPath);
     if (!QFileInfo(localPath).isFile() || !source.open(QIODevice::ReadOnly))
@@ -299,7 +301,7 @@ int _ZantDevice::CopyFileToDevice(const QString& localPath, const QString& devic
     int result = query(Operation::CopyToDeviceBegin, pack(devicePath, quint64(source.size())), transferId);
     if (result != 0)
         return result;
-    result = upload(transferId, source);
+    result = upload(transferId, source, callback, context);
     if (result != 0)
         return result;
     QByteArray body;

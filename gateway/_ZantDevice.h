@@ -66,9 +66,14 @@ public:
     EnablementStatus GlobalTestSigStatus(QString& mode, QString& owner, QString& expiry);
 
     // Transfers stream in chunks and land under a temporary name that is renamed when
-    // complete: a failed or cut copy leaves no partial file on either side.
-    int CopyFileToPC(const QString& devicePath, const QString& localPath);
-    int CopyFileToDevice(const QString& localPath, const QString& devicePath);
+    // complete: a failed or cut copy leaves no partial file on either side. The callback,
+    // on the calling thread, gets (-1, total KiB) once the size is known and (done KiB,
+    // total KiB) after each chunk; answering true stops the copy after that chunk with
+    // PortlexError::Cancelled.
+    int CopyFileToPC(const QString& devicePath, const QString& localPath, PortlexProgressCallback callback = nullptr,
+                     void* context = nullptr);
+    int CopyFileToDevice(const QString& localPath, const QString& devicePath, PortlexProgressCallback callback = nullptr,
+                         void* context = nullptr);
     // Sends a .zantro package to be extracted into the volume's install folder; statusText
     // tells the outcome (why it was refused, on failure).
     int InstallPackage(const QString& localPath, unsigned short volumeId);
@@ -92,8 +97,8 @@ private:
     int query(Operation operation, const QByteArray& request, Fields&... fields);
     EnablementStatus enablement(Operation operation, QString& mode, QString& owner, QString& expiry);
     // Streams source into the open upload transferId; aborts it on the device when the
-    // local file fails.
-    int upload(quint32 transferId, QIODevice& source);
+    // local file fails or the callback stops it.
+    int upload(quint32 transferId, QIODevice& source, PortlexProgressCallback callback = nullptr, void* context = nullptr);
 
     mutable QMutex m_mutex;
     QString m_socketPath;

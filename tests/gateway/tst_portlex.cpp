@@ -356,6 +356,50 @@ private slots:
         }
     }
 
+    // The callback hears the size, then every chunk; asking to stop after the first chunk
+    // ends the copy with Cancelled and leaves neither side changed.
+    void progressAndCancel_data()
+    {
+        QTest::addColumn<bool>("toDevice");
+        QTest::newRow("to the device") << true;
+        QTest::newRow("to the PC") << false;
+    }
+
+    void progressAndCancel()
+    {
+        QFETCH(bool, toDevice);
+        const QByteArray bytes = randomBytes(3 * Protocol::TransferChunkSize + 5, 6);
+        m_image->writeFile(QStringLiteral("flash/user/big.bin"), bytes);
+        QVERIFY(writeFile(local(QStringLiteral("big.bin")), bytes));
+        const QSharedPointer<_ZantDevice> device = serve();
+        QVERIFY(device);
+        struct Progress
+        {
+            QVector<QPair<int, int>> calls;
+            bool stop = false;
+        } progress;
+        const PortlexProgressCallback callback = [](void* context, int value, int maximum, const QString&) {
+            auto* seen = static_cast<Progress*>(context);
+            seen->calls.append({ value, maximum });
+            return seen->stop && value >= 0;
+        };
+        const auto copy = [&](const QString& name) {
+            return toDevice ? device->CopyFileToDevice(local(QStringLiteral("big.bin")), QStringLiteral("/user/") + name, callback, &progress)
+                            : device->CopyFileToPC(QStringLiteral("/user/big.bin"), local(name), callback, &progress);
+        };
+        const int totalKiB = 3 * 1024 + 1;
+        QCOMPARE(copy(QStringLiteral("whole.bin")), 0);
+        QCOMPARE(progress.calls, (QVector<QPair<int, int>> { { -1, totalKiB }, { 1024, totalKiB }, { 2048, totalKiB },
+                                                             { 3072, totalKiB }, { totalKiB, totalKiB } }));
+        const QByteArray deviceBefore = treeDigest(flash());
+        const QStringList localBefore = treeEntries(m_local->path());
+        progress = { {}, true };
+        QCOMPARE(copy(QStringLiteral("cut.bin")), int(PortlexError::Cancelled));
+        QCOMPARE(progress.calls, (QVector<QPair<int, int>> { { -1, totalKiB }, { 1024, totalKiB } }));
+        QCOMPARE(treeDigest(flash()), deviceBefore);
+        QCOMPARE(treeEntries(m_local->path()), localBefore);
+    }
+
     void failuresChangeNothing()
     {
         const QSharedPointer<_ZantDevice> device = serve(2 * 1024 * 1024);
