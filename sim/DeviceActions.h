@@ -3,6 +3,7 @@
 #include "Answer.h"
 #include "Request.h"
 #include "TransferTable.h"
+#include "VolumePathResolver.h"
 
 #include <functional>
 
@@ -39,6 +40,10 @@ private:
     Answer copyToPCBegin(const Request& request);
     Answer copyToPCChunk(const Request& request);
     Answer copyToDeviceBegin(const Request& request);
+    // A copy into folders that do not exist yet: the deepest folder that does holds the
+    // partial file (staging), and the missing ones are made when the copy completes.
+    VolumePathResolver::Status resolveInNewFolders(const QString& devicePath, VolumePathResolver::Target& target,
+                                                   QString& staging) const;
     Answer uploadChunk(const Request& request);
     Answer copyToDeviceCommit(const Request& request);
     Answer installBegin(const Request& request);

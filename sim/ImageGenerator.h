@@ -4,7 +4,8 @@
 
 // Writes a large synthetic device image for benchmarks and load tests: N modules with
 // MIFs below usermod/, N classes spread over them, N MIME records in those MIFs (the
-// registry), N files in one folder (/shared/bulk), N resident processes and a settings
+// registry), N files in /shared/bulk (or spread over N folders below it), N resident
+// processes and a settings
 // store of N nodes. The same counts always give the same image.
 class ImageGenerator
 {
@@ -14,6 +15,8 @@ public:
         int modules = 100;
         int classes = 200;
         int files = 100;
+        // Folders below /shared/bulk that hold the files, in turn; 0: the files lie in it.
+        int folders = 0;
         int processes = 10;
         // -1: one MIME record per module that exports a class.
         int mimeTypes = -1;

@@ -17,11 +17,12 @@ QString SimOptions::helpText()
         "Usage:\n"
         "  zantro-sim --image DIR [options]      serve one device until SIGINT or SIGTERM\n"
         "  zantro-sim generate OUT --modules N --classes N --files N --processes N\n"
-        "                      [--mime-types N] [--settings N]\n"
+        "                      [--mime-types N] [--settings N] [--folders N]\n"
         "                                        write a large synthetic image to OUT: N MIME\n"
         "                                        records in the modules (default one per module\n"
         "                                        that exports a class), a settings store of N\n"
-        "                                        nodes (default the five named branches)\n"
+        "                                        nodes (default the five named branches), the\n"
+        "                                        files spread over N folders of /shared/bulk\n"
         "  zantro-sim make-sample DESCRIPTION IMAGE\n"
         "                                        write the modules and files a sample\n"
         "                                        description lists into IMAGE\n"
@@ -146,7 +147,8 @@ bool SimOptions::parseGenerate(const QStringList& arguments)
     const QCommandLineOption processes(QStringLiteral("processes"), QString(), QStringLiteral("N"), QStringLiteral("10"));
     const QCommandLineOption mimeTypes(QStringLiteral("mime-types"), QString(), QStringLiteral("N"));
     const QCommandLineOption settings(QStringLiteral("settings"), QString(), QStringLiteral("N"), QStringLiteral("0"));
-    parser.addOptions({modules, classes, files, processes, mimeTypes, settings});
+    const QCommandLineOption folders(QStringLiteral("folders"), QString(), QStringLiteral("N"), QStringLiteral("0"));
+    parser.addOptions({modules, classes, files, processes, mimeTypes, settings, folders});
     QStringList rest = arguments;
     rest.removeAt(1);
     if (!parser.parse(rest))
@@ -167,7 +169,7 @@ bool SimOptions::parseGenerate(const QStringList& arguments)
     constexpr int MostSettings = 100000;
     return count(modules, counts.modules) && count(classes, counts.classes) && count(files, counts.files)
         && count(processes, counts.processes) && (!parser.isSet(mimeTypes) || count(mimeTypes, counts.mimeTypes))
-        && count(settings, counts.settings, MostSettings);
+        && count(settings, counts.settings, MostSettings) && count(folders, counts.folders);
 }
 
 bool SimOptions::parseMakeSample(const QStringList& arguments)

@@ -420,7 +420,7 @@ private slots:
         QCOMPARE(toDevice("toobig.bin", "/user/big.bin"), int(PortlexError::NoSpace));
         QCOMPARE(toDevice("fits.bin", "/user/docs"), int(PortlexError::IsDirectory));
         QCOMPARE(toDevice("missing.bin", "/user/m.bin"), int(PortlexError::LocalFileError));
-        QCOMPARE(toDevice("fits.bin", "/nowhere/m.bin"), int(PortlexError::NotFound));
+        QCOMPARE(toDevice("fits.bin", "/user/notes.txt/m.bin"), int(PortlexError::NotFound));
         QCOMPARE(treeDigest(flash()), before);
         QCOMPARE(toDevice("fits.bin", "/user/fits.bin"), 0);
 
