@@ -7,6 +7,8 @@
 #include "_ZantDevice.h"
 
 #include <QDir>
+#include <QFutureWatcher>
+#include <QtConcurrent/QtConcurrentRun>
 #include <QFile>
 #include <QFileInfo>
 #include <QHeaderView>
@@ -69,6 +71,15 @@ DeviceFileSystemView::DeviceFileSystemView(QWidget* parent)
         connect(_fsTree, &ZantFSTreeWidget::SourceDropEnd, this, &DeviceFileSystemView::on__draggingEnd);
         connect(_fsTree, &ZantFSTreeWidget::SourceDropCancelled, this, &DeviceFileSystemView::on__draggingCancelled);
     }
+    // The tree sorts when its header is clicked, not after every insertion: a sorting tree
+    // sorts itself whole after each one, which a crawl of thousands of levels cannot afford.
+    // Levels come in already sorted by name.
+    _fsTree->setSortingEnabled(false);
+    QHeaderView* header = _fsTree->header();
+    header->setSortIndicatorShown(true);
+    header->setSectionsClickable(true);
+    header->setSortIndicator(0, Qt::AscendingOrder);
+    connect(header, &QHeaderView::sortIndicatorChanged, _fsTree, &QTreeWidget::sortItems);
     connect(&m_pacer, &TickPacer::timeout, this, &DeviceFileSystemView::onTimeElapse);
     m_pacer.armFirst(FirstTickMs);
 }
@@ -146,11 +157,32 @@ void DeviceFileSystemView::selectVolume(const QString& mountPoint)
         m_volume.mountPoint = FirstVolume;
     if (m_volume.mountPoint == mountPoint)
         return;
+    // Without updates the view skips working out what each removal would repaint.
+    _fsTree->setUpdatesEnabled(false);
     _fsTree->clear();
+    _fsTree->setUpdatesEnabled(true);
     m_itemsByPath.clear();
+    // What the crawl brings for the tree just cleared is dropped.
+    m_crawl->restart(QString());
 
-    QSet<VolumeInfo> volumes;
-    if (m_device->GetVolumes(volumes) != 0) {
+    // The device may take long to count its free space: the GUI thread does not wait for it.
+    const quint64 request = ++m_volumeRequest;
+    auto* answer = new QFutureWatcher<QPair<int, QSet<VolumeInfo>>>(this);
+    connect(answer, &QFutureWatcherBase::finished, this, [this, answer, request, mountPoint] {
+        answer->deleteLater();
+        if (request == m_volumeRequest)
+            showVolume(answer->result().first, answer->result().second, mountPoint);
+    });
+    answer->setFuture(QtConcurrent::run([device = m_device] {
+        QSet<VolumeInfo> volumes;
+        const int result = device->GetVolumes(volumes);
+        return qMakePair(result, volumes);
+    }));
+}
+
+void DeviceFileSystemView::showVolume(int result, const QSet<VolumeInfo>& volumes, const QString& mountPoint)
+{
+    if (result != 0) {
         _friendlyName->setText(QStringLiteral("Volume not found."));
         return;
     }
@@ -172,7 +204,7 @@ void DeviceFileSystemView::selectVolume(const QString& mountPoint)
     _volumeId->setText(QString::number(m_volume.volumeId));
     _mounted->setChecked(m_volume.mounted);
     _removable->setChecked(m_volume.removable);
-    _fsTree->sortByColumn(0, Qt::AscendingOrder);
+    _fsTree->header()->setSortIndicator(0, Qt::AscendingOrder);
     _fsTree->setProperty("MountPoint", m_volume.mountPoint);
     m_crawl->restart(m_volume.mountPoint);
 }
@@ -218,7 +250,7 @@ void DeviceFileSystemView::graft(const FileSystemCrawl::Level& level)
         m_itemsByPath.insert(folder->Path(), item);
         items.append(item);
     }
-    // Inserted in the order the tree's sort gives them, so the sort has little to move.
+    // In the order the tree's sort gives them.
     std::stable_sort(items.begin(), items.end(), [](const QTreeWidgetItem* a, const QTreeWidgetItem* b) { return *a < *b; });
     if (QTreeWidgetItem* parent = m_itemsByPath.value(level->Path()))
         parent->addChildren(items);

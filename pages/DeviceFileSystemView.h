@@ -86,6 +86,8 @@ signals:
     void transferFinished();
 
 private:
+    // Shows the volume the device answered with and starts its crawl.
+    void showVolume(int result, const QSet<VolumeInfo>& volumes, const QString& mountPoint);
     void graft(const FileSystemCrawl::Level& level);
     void startWatchers();
     void stopWatchers();
@@ -101,7 +103,7 @@ private:
     QIcon m_fileIcon;
     QIcon m_folderIcon;
     VolumeInfo m_volume;
-    QString m_selectedMountPoint;
+    quint64 m_volumeRequest = 0; // the latest volume read; earlier answers are dropped
     QSharedPointer<FileSystemCrawl> m_crawl = QSharedPointer<FileSystemCrawl>::create();
     TickPacer m_pacer{0, IdleCapMs};
     QHash<QString, QTreeWidgetItem*> m_itemsByPath;

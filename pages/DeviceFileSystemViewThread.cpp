@@ -12,7 +12,8 @@ void FileSystemCrawl::restart(const QString& root)
     ++m_load;
     m_requests.clear();
     m_levels.clear();
-    m_requests.push(0, root);
+    if (!root.isEmpty())
+        m_requests.push(0, root);
 }
 
 bool FileSystemCrawl::take(QString& path, quint64& load)

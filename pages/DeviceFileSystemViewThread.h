@@ -19,7 +19,8 @@ class FileSystemCrawl
 public:
     using Level = QSharedPointer<_DirectoryInfo>;
 
-    // GUI thread: forgets what is pending and queues root as the first fetch of a new load.
+    // GUI thread: forgets what is pending and queues root (unless empty) as the first fetch
+    // of a new load.
     void restart(const QString& root);
     // Crawler: the next folder to fetch and the load it belongs to; false when none.
     bool take(QString& path, quint64& load);

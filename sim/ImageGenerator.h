@@ -15,13 +15,13 @@ public:
         int modules = 100;
         int classes = 200;
         int files = 100;
-        // Folders below /shared/bulk that hold the files, in turn; 0: the files lie in it.
-        int folders = 0;
         int processes = 10;
         // -1: one MIME record per module that exports a class.
         int mimeTypes = -1;
         // Nodes of the settings store; it always holds the five named branches.
         int settings = 0;
+        // Folders below /shared/bulk that hold the files, in turn; 0: the files lie in it.
+        int folders = 0;
     };
 
     bool generate(const QString& imageDir, const Counts& counts);

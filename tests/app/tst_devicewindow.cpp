@@ -15,6 +15,7 @@
 #include <QTest>
 #include <QTimer>
 #include <QVBoxLayout>
+#include <unistd.h>
 
 // A page the test drives by hand, to see what the window does with a page's signals.
 class FakePage : public StubPage
@@ -240,7 +241,8 @@ private slots:
             window->onFileSystemDoubleClick(path);
         QDesktopServices::unsetUrlHandler("file");
         qputenv("TMPDIR", previous);
-        const QString local = temporary.filePath("readme.txt");
+        // In this user's own folder below the temporary one.
+        const QString local = temporary.filePath("delvix-" + QString::number(::geteuid()) + "/readme.txt");
         QCOMPARE(desktop.opened, QList<QUrl>({QUrl::fromLocalFile(local)}));
         QCOMPARE(TestSupport::readFile(local),
                  TestSupport::readFile(SimulatorProcess::sampleImage("simulator") + "/flash/shared/readme.txt"));

@@ -186,22 +186,29 @@ private slots:
         QVERIFY(serve(rule.isEmpty() ? QStringList() : QStringList{"--fail", rule}));
         DeviceFileSystemView page;
         page.startComponent("fs");
-        QTRY_COMPARE_WITH_TIMEOUT(page.status(), QString("Ready"), 20000);
-        QCOMPARE(page._friendlyName->text(), QString("Flash"));
+        QTRY_COMPARE_WITH_TIMEOUT(page._friendlyName->text(), QString("Flash"), 20000);
         QCOMPARE(page._volumeId->text(), QString("65537"));
 
-        int expectedItems = 0;
-        for (const QString& path : fetched) {
-            const auto level = std::find_if(CrawlOrder.cbegin(), CrawlOrder.cend(), [&](const auto& l) { return l.first == path; });
-            expectedItems += level->second;
-            page.onTimeElapse();
-            QCOMPARE(itemCount(page._fsTree), expectedItems);
-            if (path != "/")
-                QCOMPARE(itemAt(page._fsTree, path)->childCount(), level->second);
-        }
-        page.onTimeElapse();
-        QCOMPARE(itemCount(page._fsTree), expectedItems);
-        QCOMPARE(page.pacer().lastArmed(), 100);
+        // Each busy tick shows the next level in crawl order under its folder's item.
+        int shown = 0;
+        int before = 0;
+        QStringList wrong;
+        connect(&page.pacer(), &TickPacer::armed, this, [&](int ms) {
+            const int now = itemCount(page._fsTree);
+            if (ms == 0 && shown < fetched.size()) {
+                const QString path = fetched.at(shown++);
+                const auto level = std::find_if(CrawlOrder.cbegin(), CrawlOrder.cend(), [&](const auto& l) { return l.first == path; });
+                if (now - before != level->second || (path != "/" && itemAt(page._fsTree, path)->childCount() != level->second))
+                    wrong << path;
+            } else if (now != before) {
+                wrong << "unexpected level";
+            }
+            before = now;
+        });
+        QTRY_VERIFY_WITH_TIMEOUT(shown == fetched.size() && page.status() == "Ready", 20000);
+        // Two empty ticks: nothing more comes.
+        QTRY_VERIFY_WITH_TIMEOUT(page.pacer().lastArmed() >= 200, 20000);
+        QCOMPARE(wrong, QStringList());
         if (rule.isEmpty()) {
             QCOMPARE(treeLines(page._fsTree),
                      QStringList({"alpha||", " nine.bin|9998 bytes|rw-", " ten.bin|9.76 kB|rw-", "err||", " e.log|1 bytes|rw-",
