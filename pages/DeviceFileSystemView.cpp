@@ -164,6 +164,7 @@ void DeviceFileSystemView::selectVolume(const QString& mountPoint)
     m_itemsByPath.clear();
     // What the crawl brings for the tree just cleared is dropped.
     m_crawl->restart(QString());
+    setStatus(QStringLiteral("Processing File System..."));
 
     // The device may take long to count its free space: the GUI thread does not wait for it.
     const quint64 request = ++m_volumeRequest;
@@ -184,6 +185,7 @@ void DeviceFileSystemView::showVolume(int result, const QSet<VolumeInfo>& volume
 {
     if (result != 0) {
         _friendlyName->setText(QStringLiteral("Volume not found."));
+        setStatus(readyStatus());
         return;
     }
     // A set has no order of its own: "the first volume" is the one mounted highest.
@@ -193,8 +195,10 @@ void DeviceFileSystemView::showVolume(int result, const QSet<VolumeInfo>& volume
     const auto chosen = std::find_if(ordered.cbegin(), ordered.cend(), [&mountPoint](const VolumeInfo& volume) {
         return mountPoint.isEmpty() || volume.mountPoint == mountPoint;
     });
-    if (chosen == ordered.cend())
+    if (chosen == ordered.cend()) {
+        setStatus(readyStatus());
         return;
+    }
 
     m_volume = *chosen;
     _friendlyName->setText(m_volume.friendlyName);

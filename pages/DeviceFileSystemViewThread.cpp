@@ -5,6 +5,7 @@
 #include <QMutexLocker>
 
 #include <algorithm>
+#include <utility>
 
 void FileSystemCrawl::restart(const QString& root)
 {
@@ -61,16 +62,20 @@ quint16 DeviceFileSystemViewThread::priorityOf(const QString& path)
 
 void DeviceFileSystemViewThread::work()
 {
+    // "Ready" once the crawl has run dry, not while the page is still reading its volume.
+    bool fetched = false;
     while (!isStopRequested()) {
         QString path;
         quint64 load = 0;
         if (!m_crawl->take(path, load)) {
-            reportStatus(GatewayComponentWidget::readyStatus());
+            if (std::exchange(fetched, false))
+                reportStatus(GatewayComponentWidget::readyStatus());
             m_idleDelay = std::min(m_idleDelay + IdleStepMs, IdleCapMs);
             pause(m_idleDelay);
             continue;
         }
         reportStatus(QStringLiteral("Processing File System..."));
+        fetched = true;
         auto level = QSharedPointer<_DirectoryInfo>::create();
         const int result = m_device->GetFileSystemLevel(path, level, nullptr, nullptr);
         if (isStopRequested())

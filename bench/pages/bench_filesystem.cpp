@@ -110,7 +110,7 @@ void crawl(DeviceWindow& window)
     runUntil(
         [&] {
             // Once the crawler is done, two empty ticks in a row mean that nothing is pending.
-            crawled = crawled || page->status() == QLatin1String("Ready");
+            crawled = crawled || (lastInsert > 0 && page->status() == QLatin1String("Ready"));
             return crawled && page->pacer().lastArmed() >= 200;
         },
         gap,
