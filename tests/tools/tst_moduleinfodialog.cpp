@@ -17,6 +17,8 @@
 #include <QTemporaryDir>
 #include <QtTest>
 
+#include <unistd.h>
+
 Q_DECLARE_METATYPE(MifEntry)
 
 namespace {
@@ -418,7 +420,7 @@ private slots:
         QDesktopServices::unsetUrlHandler("file");
         qputenv("TMPDIR", previous);
 
-        const QString local = temporary.filePath(name);
+        const QString local = temporary.filePath("delvix-" + QString::number(::geteuid()) + "/" + name);
         QCOMPARE(TestSupport::readFile(local), MifWriter::moduleData(oddModule()));
         const QList<ModuleInfoDialog*> dialogs = openDialogs();
         if (title.isEmpty()) {
