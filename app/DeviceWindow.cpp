@@ -1,9 +1,11 @@
 #include "DeviceWindow.h"
 
+#include "DeviceFileSystemView.h"
 #include "EnsureWindowPlacementOnDesktop.h"
 #include "LockStatusWidget.h"
 #include "ModuleInfoDialog.h"
 #include "Portlex.h"
+#include "PrivateTempFolder.h"
 #include "SaveXmlReport.h"
 #include "SecuritySettingsDialog.h"
 
@@ -247,6 +249,8 @@ void DeviceWindow::onToolbarActionTriggered(QAction* triggerAction)
     m_currentPage = pageAt(index);
     if (m_currentPage == _moduleListView)
         connect(_moduleListView, &ModuleListView::doubleClick, this, &DeviceWindow::onModuleInfoExamine);
+    if (m_currentPage == _deviceFSView)
+        connect(_deviceFSView, &DeviceFileSystemView::doubleClick, this, &DeviceWindow::onFileSystemDoubleClick);
     attachCurrentPage();
     if (!m_currentPage) {
         onComponentStateChange(GatewayComponentWidget::Starting);
@@ -338,7 +342,12 @@ void DeviceWindow::onFileSystemDoubleClick(QString path)
     // A name like ".." would make the copy land outside the temporary folder.
     if (!device || fileName.isEmpty() || fileName == "." || fileName == "..")
         return;
-    const QString local = QDir::cleanPath(QDir::tempPath()) + QDir::separator() + fileName;
+    // Not the shared temporary folder itself: another user could plant a file or a link there
+    // under the name the copy is about to take.
+    const QString folder = privateTempFolder(QDir::tempPath());
+    if (folder.isEmpty())
+        return;
+    const QString local = folder + QLatin1Char('/') + fileName;
     if (device->CopyFileToPC(path, local) != 0)
         return;
     // A module's information file opens in the module information window, not on the desktop.

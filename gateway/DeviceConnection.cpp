@@ -117,7 +117,7 @@ qint32 DeviceConnection::upload(Operation operation, const QByteArray& request, 
         while (read < length) {
             const ssize_t got = ::pread(file, frame.data() + Protocol::HeaderSize + read, length - read, off_t(sent + read));
             if (got <= 0 && !(got < 0 && errno == EINTR))
-                return fail(PortlexError::LocalFileError, QStringLiteral("The file to send could not be read"));
+                return stopUpload(header, PortlexError::LocalFileError, deadline);
             read += std::max<ssize_t>(got, 0);
         }
         header.encodeHeader(frame.data(), length);
@@ -126,10 +126,23 @@ qint32 DeviceConnection::upload(Operation operation, const QByteArray& request, 
         sent += length;
         deadline.setRemainingTime(patience);
         if (progress && (result = progress(sent)) != 0)
-            return fail(result, QStringLiteral("The upload was stopped on this side (%1)").arg(result));
+            return stopUpload(header, result, deadline);
     }
     QByteArray body;
     return receive(operation, &body, deadline);
+}
+
+qint32 DeviceConnection::stopUpload(const Frame& header, qint32 code, QDeadlineTimer deadline)
+{
+    // An empty Data frame ends the upload on the device, which removes what it received
+    // before it answers: when this returns, nothing of the file is left there.
+    char empty[Protocol::HeaderSize];
+    header.encodeHeader(empty, 0);
+    QByteArray body;
+    if (writeAll(empty, Protocol::HeaderSize, deadline) == 0)
+        receive(Operation(header.operation), &body, deadline);
+    m_error = QStringLiteral("The upload was stopped on this side (%1)").arg(code);
+    return code;
 }
 
 bool DeviceConnection::startHandshake()

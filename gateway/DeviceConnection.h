@@ -1,5 +1,6 @@
 #pragma once
 
+#include "Frame.h"
 #include "FrameDecoder.h"
 #include "Protocol.h"
 
@@ -46,8 +47,9 @@ public:
     // hands the bytes of each Data frame to sink as they come; upload sends the request,
     // then size bytes of the open file from its start as Data frames, and calls progress
     // with the bytes sent after each. A non-zero code from sink or progress ends the call
-    // with that code and drops the connection, so the device discards the transfer. Every
-    // frame restarts the deadline.
+    // with that code, and the device's transfer with it: an upload is ended in step (the
+    // device has removed its partial file when the call returns), a download by dropping
+    // the connection. Every frame restarts the deadline.
     using DataSink = std::function<qint32(const char* data, qint64 size)>;
     using UploadProgress = std::function<qint32(quint64 sent)>;
     qint32 download(Operation operation, const QByteArray& request, const DataSink& sink, QDeadlineTimer deadline);
@@ -74,6 +76,9 @@ private:
     qint32 receive(Operation operation, QByteArray* body, QDeadlineTimer deadline);
     // Sends a stream request, on a new connection if need be.
     qint32 sendStream(Operation operation, const QByteArray& request, QDeadlineTimer deadline);
+    // Ends an upload stream at a frame boundary for a reason of this side (code), keeping
+    // the connection in step.
+    qint32 stopUpload(const Frame& header, qint32 code, QDeadlineTimer deadline);
     // The answer's result, its fields after the result into body.
     qint32 takeAnswer(const Frame& frame, Operation operation, QByteArray* body);
     // Raw stream access for bulk data, past the decoder: both fail the connection and

@@ -257,8 +257,6 @@ int _ZantDevice::upload(Operation operation, quint32 transferId, QFile& source, 
 {
     const quint64 size = quint64(source.size());
     const TransferProgress progress(callback, context, size);
-    if (progress.cancelled(0))
-        return PortlexError::Cancelled;
     DeviceConnection& connection = ThreadConnections::forDevice(m_lifetime, socketPath());
     return connection.upload(operation, pack(transferId, size), source.handle(), size,
                              [&progress](quint64 sent) { return progress.cancelled(sent) ? qint32(PortlexError::Cancelled) : 0; },
@@ -277,8 +275,6 @@ int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPat
     const TransferProgress progress(callback, context, size);
     if (!sink.open(QIODevice::WriteOnly))
         result = PortlexError::LocalFileError;
-    else if (progress.cancelled(0))
-        result = PortlexError::Cancelled;
     const bool started = result == 0;
     bool streamed = false;
     if (started) {

@@ -117,7 +117,8 @@ enum class Operation : quint32
     // request: quint32 transferId, quint64 size (the bytes the transfer still expects)
     // The client sends size bytes as Data request frames right after the request, without
     // waiting. The device answers once it has them all, or at once on a refusal or failure
-    // (which ends the transfer).
+    // (which ends the transfer). An empty Data frame is the client's stop: the device ends
+    // the transfer, removing its temporary file, and answers Cancelled.
     // answer:  nothing more
     UploadStream = 34,
     // request: quint32 transferId             answer: nothing more (the file is in place)

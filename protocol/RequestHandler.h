@@ -30,7 +30,8 @@ public:
         Q_UNUSED(connectionId) Q_UNUSED(transferId) Q_UNUSED(data) Q_UNUSED(max)
         return -qint64(PortlexError::UnknownOperation);
     }
-    // Bytes for the open upload: 0, or an error code (the transfer is over).
+    // Bytes for the open upload: 0, or an error code (the transfer is over). No bytes (size
+    // 0): the client stops the upload, which ends the transfer.
     virtual qint32 writeStream(quint64 connectionId, quint32 transferId, const char* data, qint64 size)
     {
         Q_UNUSED(connectionId) Q_UNUSED(transferId) Q_UNUSED(data) Q_UNUSED(size)

@@ -121,8 +121,12 @@ bool ServerConnection::startFrame()
 bool ServerConnection::finishFrame()
 {
     m_headerFill = 0;
-    if (m_reading.flags & Protocol::DataFlag)
+    if (m_reading.flags & Protocol::DataFlag) {
+        // An empty one is the client's stop.
+        if (m_piece.isEmpty())
+            receiveUpload(m_reading.requestId, nullptr, 0);
         return true;
+    }
     const bool open = dispatch(m_reading);
     m_reading.payload.clear();
     return open;
@@ -234,7 +238,7 @@ void ServerConnection::receiveUpload(quint32 requestId, const char* data, qint64
 {
     // Data of a stream answered already (refused early) is dropped, as the client may
     // still be finishing it.
-    if (size <= 0 || !m_stream || isDownload(m_stream->request) || requestId != m_stream->request.requestId)
+    if (size < 0 || !m_stream || isDownload(m_stream->request) || requestId != m_stream->request.requestId)
         return;
     const qint32 result = m_handler->writeStream(m_id, m_stream->transferId, data, size);
     m_stream->expected -= std::min<quint64>(m_stream->expected, quint64(size));

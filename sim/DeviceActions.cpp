@@ -184,7 +184,9 @@ qint32 DeviceActions::writeStream(quint64 connectionId, quint32 id, const char* 
     if (!transfer)
         return PortlexError::NotFound;
     qint32 result = 0;
-    if (quint64(size) > transfer->size - transfer->done)
+    if (size == 0)
+        result = PortlexError::Cancelled;
+    else if (quint64(size) > transfer->size - transfer->done)
         result = PortlexError::TransferIncomplete;
     else if (transfer->file->write(data, size) != size)
         result = PortlexError::IoError;
@@ -218,7 +220,10 @@ Answer DeviceActions::copyToDeviceBegin(const Request& request)
     if (!in.ok())
         return Answer::failure(PortlexError::BadRequest);
     VolumePathResolver::Target target;
-    const VolumePathResolver::Status status = m_state.resolver().resolveForCreate(path, target);
+    QString staging;
+    VolumePathResolver::Status status = m_state.resolver().resolveForCreate(path, target);
+    if (status == VolumePathResolver::Status::NotFound)
+        status = resolveInNewFolders(path, target, staging);
     if (status != VolumePathResolver::Status::Ok)
         return Answer::failure(codeFor(status));
     if (TransferTable::hasReservedName(target.devicePath))
@@ -240,7 +245,7 @@ Answer DeviceActions::copyToDeviceBegin(const Request& request)
     TransferTable::Transfer transfer;
     transfer.connectionId = request.connectionId;
     transfer.kind = TransferTable::Kind::Upload;
-    transfer.file = TransferTable::createPartial(QFileInfo(target.localPath).path());
+    transfer.file = TransferTable::createPartial(staging.isEmpty() ? QFileInfo(target.localPath).path() : staging);
     if (!transfer.file)
         return Answer::failure(PortlexError::IoError);
     transfer.targetPath = target.localPath;
@@ -248,6 +253,34 @@ Answer DeviceActions::copyToDeviceBegin(const Request& request)
     transfer.size = size;
     transfer.lastActive = m_now;
     return Answer::success(m_transfers.add(std::move(transfer)));
+}
+
+VolumePathResolver::Status DeviceActions::resolveInNewFolders(const QString& devicePath, VolumePathResolver::Target& target,
+                                                             QString& staging) const
+{
+    QStringList missing;
+    QString existing = devicePath;
+    while (existing != QLatin1String("/")) {
+        const qsizetype slash = existing.lastIndexOf(QLatin1Char('/'));
+        if (slash < 0)
+            break;
+        missing.prepend(existing.mid(slash + 1));
+        existing = slash == 0 ? QStringLiteral("/") : existing.left(slash);
+        VolumePathResolver::Target folder;
+        const VolumePathResolver::Status status = m_state.resolver().resolveExisting(existing, folder);
+        if (status == VolumePathResolver::Status::NotFound)
+            continue;
+        if (status != VolumePathResolver::Status::Ok)
+            return status;
+        if (!isDirectory(folder.localPath))
+            return VolumePathResolver::Status::NotFound;
+        target.volume = folder.volume;
+        target.devicePath = devicePath;
+        target.localPath = folder.localPath + QLatin1Char('/') + missing.join(QLatin1Char('/'));
+        staging = folder.localPath;
+        return VolumePathResolver::Status::Ok;
+    }
+    return VolumePathResolver::Status::NotFound;
 }
 
 Answer DeviceActions::copyToDeviceCommit(const Request& request)
@@ -265,7 +298,8 @@ Answer DeviceActions::copyToDeviceCommit(const Request& request)
         return Answer::failure(PortlexError::TransferIncomplete);
     }
     transfer->file->close();
-    const bool written = transfer->file->error() == QFileDevice::NoError;
+    const bool written = transfer->file->error() == QFileDevice::NoError
+        && QDir().mkpath(QFileInfo(transfer->targetPath).path());
     // rename() replaces the target in one step; a link in its place is replaced, not followed.
     if (!written
         || std::rename(QFile::encodeName(transfer->file->fileName()).constData(),

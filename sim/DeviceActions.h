@@ -3,6 +3,7 @@
 #include "Answer.h"
 #include "Request.h"
 #include "TransferTable.h"
+#include "VolumePathResolver.h"
 
 #include <functional>
 
@@ -46,6 +47,10 @@ private:
     // The connection's open transfer of that kind (an upload: of either kind), marked active.
     TransferTable::Transfer* streamed(quint64 connectionId, quint32 id, TransferTable::Kind kind);
     Answer copyToDeviceBegin(const Request& request);
+    // A copy into folders that do not exist yet: the deepest folder that does holds the
+    // partial file (staging), and the missing ones are made when the copy completes.
+    VolumePathResolver::Status resolveInNewFolders(const QString& devicePath, VolumePathResolver::Target& target,
+                                                   QString& staging) const;
     Answer copyToDeviceCommit(const Request& request);
     Answer installBegin(const Request& request);
     Answer installCommit(const Request& request);

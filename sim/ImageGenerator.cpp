@@ -107,9 +107,9 @@ MifMimeType mimeRecord(int j, const ImageGenerator::Counts& counts)
 
 bool ImageGenerator::generate(const QString& imageDir, const Counts& counts)
 {
-    if (counts.modules < 0 || counts.classes < 0 || counts.files < 0 || counts.processes < 0 || counts.mimeTypes < -1
-        || counts.settings < 0 || counts.threads < 0 || counts.loadedModules < 0 || counts.churn < -1
-        || counts.churn > 100) {
+    if (counts.modules < 0 || counts.classes < 0 || counts.files < 0 || counts.folders < 0 || counts.processes < 0
+        || counts.mimeTypes < -1 || counts.settings < 0 || counts.threads < 0 || counts.loadedModules < 0
+        || counts.churn < -1 || counts.churn > 100) {
         m_error = QStringLiteral("counts must not be negative");
         return false;
     }
@@ -147,7 +147,10 @@ bool ImageGenerator::generate(const QString& imageDir, const Counts& counts)
 
     const QByteArray line("generated file\n");
     for (int f = 0; f < counts.files; ++f) {
-        const QString path = image.filePath(QStringLiteral("flash/shared/bulk/file%1.txt").arg(f, 6, 10, QLatin1Char('0')));
+        const QString folder = counts.folders > 0
+            ? QStringLiteral("flash/shared/bulk/d%1/").arg(f % counts.folders, 5, 10, QLatin1Char('0'))
+            : QStringLiteral("flash/shared/bulk/");
+        const QString path = image.filePath(folder + QStringLiteral("file%1.txt").arg(f, 6, 10, QLatin1Char('0')));
         if (!SampleBuilder::writeFile(path, line, &m_error))
             return false;
     }

@@ -4,9 +4,9 @@
 
 // Writes a large synthetic device image for benchmarks and load tests: N modules with
 // MIFs below usermod/, N classes spread over them, N MIME records in those MIFs (the
-// registry), N files in one folder (/shared/bulk), N resident processes (with N threads and
-// N loaded modules each, a given share of them changing every second) and a settings store
-// of N nodes. The same counts always give the same image.
+// registry), N files in /shared/bulk (or spread over N folders below it), N resident
+// processes (with N threads and N loaded modules each, a given share of them changing every
+// second) and a settings store of N nodes. The same counts always give the same image.
 class ImageGenerator
 {
 public:
@@ -26,6 +26,8 @@ public:
         // Percent of the processes whose threads or modules change every second; -1 leaves
         // the processes to the default evolution (one change every two seconds).
         int churn = -1;
+        // Folders below /shared/bulk that hold the files, in turn; 0: the files lie in it.
+        int folders = 0;
     };
 
     bool generate(const QString& imageDir, const Counts& counts);

@@ -17,12 +17,13 @@ QString SimOptions::helpText()
         "Usage:\n"
         "  zantro-sim --image DIR [options]      serve one device until SIGINT or SIGTERM\n"
         "  zantro-sim generate OUT --modules N --classes N --files N --processes N\n"
-        "                      [--mime-types N] [--settings N] [--threads N]\n"
+        "                      [--mime-types N] [--settings N] [--folders N] [--threads N]\n"
         "                      [--loaded-modules N] [--churn PERCENT]\n"
         "                                        write a large synthetic image to OUT: N MIME\n"
         "                                        records in the modules (default one per module\n"
         "                                        that exports a class), a settings store of N\n"
-        "                                        nodes (default the five named branches), N\n"
+        "                                        nodes (default the five named branches), the\n"
+        "                                        files spread over N folders of /shared/bulk, N\n"
         "                                        threads (default 2) and N loaded modules\n"
         "                                        (default 1) per process, PERCENT of the\n"
         "                                        processes changing every second (0: none)\n"
@@ -150,10 +151,11 @@ bool SimOptions::parseGenerate(const QStringList& arguments)
     const QCommandLineOption processes(QStringLiteral("processes"), QString(), QStringLiteral("N"), QStringLiteral("10"));
     const QCommandLineOption mimeTypes(QStringLiteral("mime-types"), QString(), QStringLiteral("N"));
     const QCommandLineOption settings(QStringLiteral("settings"), QString(), QStringLiteral("N"), QStringLiteral("0"));
+    const QCommandLineOption folders(QStringLiteral("folders"), QString(), QStringLiteral("N"), QStringLiteral("0"));
     const QCommandLineOption threads(QStringLiteral("threads"), QString(), QStringLiteral("N"), QStringLiteral("2"));
     const QCommandLineOption loaded(QStringLiteral("loaded-modules"), QString(), QStringLiteral("N"), QStringLiteral("1"));
     const QCommandLineOption churn(QStringLiteral("churn"), QString(), QStringLiteral("PERCENT"));
-    parser.addOptions({modules, classes, files, processes, mimeTypes, settings, threads, loaded, churn});
+    parser.addOptions({modules, classes, files, processes, mimeTypes, settings, folders, threads, loaded, churn});
     QStringList rest = arguments;
     rest.removeAt(1);
     if (!parser.parse(rest))
@@ -174,8 +176,9 @@ bool SimOptions::parseGenerate(const QStringList& arguments)
     constexpr int MostSettings = 100000;
     return count(modules, counts.modules) && count(classes, counts.classes) && count(files, counts.files)
         && count(processes, counts.processes) && (!parser.isSet(mimeTypes) || count(mimeTypes, counts.mimeTypes))
-        && count(settings, counts.settings, MostSettings) && count(threads, counts.threads, 1000)
-        && count(loaded, counts.loadedModules, 1000) && (!parser.isSet(churn) || count(churn, counts.churn, 100));
+        && count(settings, counts.settings, MostSettings) && count(folders, counts.folders)
+        && count(threads, counts.threads, 1000) && count(loaded, counts.loadedModules, 1000)
+        && (!parser.isSet(churn) || count(churn, counts.churn, 100));
 }
 
 bool SimOptions::parseMakeSample(const QStringList& arguments)

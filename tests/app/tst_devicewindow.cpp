@@ -14,6 +14,7 @@
 #include <QTest>
 #include <QTimer>
 #include <QVBoxLayout>
+#include <unistd.h>
 
 // A page the test drives by hand, to see what the window does with a page's signals.
 class FakePage : public StubPage

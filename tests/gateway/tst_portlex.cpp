@@ -352,52 +352,69 @@ private slots:
         QVERIFY(device->statusText.contains(QLatin1String("no volume 9")));
     }
 
-    // A copy stopped from its progress callback leaves nothing on either side, and the
-    // device goes on serving; two threads copy at once on one device without mixing.
-    void cancelledAndConcurrentCopies()
+    // Two threads copy at once on one device without mixing.
+    void concurrentCopies()
     {
         const QSharedPointer<_ZantDevice> device = serve();
         QVERIFY(device);
         const QByteArray bytes = randomBytes(8 * Protocol::TransferChunkSize + 3, 11);
         QVERIFY(writeFile(local(QStringLiteral("source.bin")), bytes));
-        struct Stop
-        {
-            int calls = 0, stopAt = 4, maximum = 0, last = 0;
-        };
-        const PortlexProgressCallback stopper = [](void* context, int value, int maximum, const QString&) {
-            auto* stop = static_cast<Stop*>(context);
-            stop->maximum = maximum;
-            stop->last = value;
-            return ++stop->calls == stop->stopAt;
-        };
-        // The range, then 0, 1 and 2 MiB done: stopped after the second chunk.
-        Stop up;
-        QCOMPARE(device->CopyFileToDevice(local(QStringLiteral("source.bin")), QStringLiteral("/user/c.bin"), stopper, &up),
-                 int(PortlexError::Cancelled));
-        QCOMPARE(up.maximum, 8 * 1024 + 1);
-        QCOMPARE(up.last, 2 * 1024);
-        QTRY_COMPARE(leftovers(flash()), QStringList());
-        QVERIFY(!QFileInfo::exists(flash(QStringLiteral("user/c.bin"))));
-
         QCOMPARE(device->CopyFileToDevice(local(QStringLiteral("source.bin")), QStringLiteral("/user/c.bin")), 0);
-        const QString target = local(QStringLiteral("target"));
-        QVERIFY(QDir().mkpath(target));
-        Stop down;
-        QCOMPARE(device->CopyFileToPC(QStringLiteral("/user/c.bin"), target + QStringLiteral("/c.bin"), stopper, &down),
-                 int(PortlexError::Cancelled));
-        QCOMPARE(down.last, 2 * 1024);
-        QCOMPARE(treeEntries(target), QStringList());
-
+        const QString target = local(QStringLiteral("c.bin"));
         std::atomic<int> upResult { -1 };
         std::unique_ptr<QThread> uploader(QThread::create([&] {
             upResult = device->CopyFileToDevice(local(QStringLiteral("source.bin")), QStringLiteral("/user/d.bin"));
         }));
         uploader->start();
-        QCOMPARE(device->CopyFileToPC(QStringLiteral("/user/c.bin"), target + QStringLiteral("/c.bin")), 0);
+        QCOMPARE(device->CopyFileToPC(QStringLiteral("/user/c.bin"), target), 0);
         QVERIFY(uploader->wait(HangLimitMs));
         QCOMPARE(upResult.load(), 0);
-        QCOMPARE(readFile(target + QStringLiteral("/c.bin")), bytes);
+        QCOMPARE(readFile(target), bytes);
         QCOMPARE(readFile(flash(QStringLiteral("user/d.bin"))), bytes);
+    }
+
+    // The callback hears the size, then every chunk; asking to stop after the first chunk
+    // ends the copy with Cancelled and leaves neither side changed.
+    void progressAndCancel_data()
+    {
+        QTest::addColumn<bool>("toDevice");
+        QTest::newRow("to the device") << true;
+        QTest::newRow("to the PC") << false;
+    }
+
+    void progressAndCancel()
+    {
+        QFETCH(bool, toDevice);
+        const QByteArray bytes = randomBytes(3 * Protocol::TransferChunkSize + 5, 6);
+        m_image->writeFile(QStringLiteral("flash/user/big.bin"), bytes);
+        QVERIFY(writeFile(local(QStringLiteral("big.bin")), bytes));
+        const QSharedPointer<_ZantDevice> device = serve();
+        QVERIFY(device);
+        struct Progress
+        {
+            QVector<QPair<int, int>> calls;
+            bool stop = false;
+        } progress;
+        const PortlexProgressCallback callback = [](void* context, int value, int maximum, const QString&) {
+            auto* seen = static_cast<Progress*>(context);
+            seen->calls.append({ value, maximum });
+            return seen->stop && value >= 0;
+        };
+        const auto copy = [&](const QString& name) {
+            return toDevice ? device->CopyFileToDevice(local(QStringLiteral("big.bin")), QStringLiteral("/user/") + name, callback, &progress)
+                            : device->CopyFileToPC(QStringLiteral("/user/big.bin"), local(name), callback, &progress);
+        };
+        const int totalKiB = 3 * 1024 + 1;
+        QCOMPARE(copy(QStringLiteral("whole.bin")), 0);
+        QCOMPARE(progress.calls, (QVector<QPair<int, int>> { { -1, totalKiB }, { 1024, totalKiB }, { 2048, totalKiB },
+                                                             { 3072, totalKiB }, { totalKiB, totalKiB } }));
+        const QByteArray deviceBefore = treeDigest(flash());
+        const QStringList localBefore = treeEntries(m_local->path());
+        progress = { {}, true };
+        QCOMPARE(copy(QStringLiteral("cut.bin")), int(PortlexError::Cancelled));
+        QCOMPARE(progress.calls, (QVector<QPair<int, int>> { { -1, totalKiB }, { 1024, totalKiB } }));
+        QCOMPARE(treeDigest(flash()), deviceBefore);
+        QCOMPARE(treeEntries(m_local->path()), localBefore);
     }
 
     void failuresChangeNothing()
@@ -420,7 +437,7 @@ private slots:
         QCOMPARE(toDevice("toobig.bin", "/user/big.bin"), int(PortlexError::NoSpace));
         QCOMPARE(toDevice("fits.bin", "/user/docs"), int(PortlexError::IsDirectory));
         QCOMPARE(toDevice("missing.bin", "/user/m.bin"), int(PortlexError::LocalFileError));
-        QCOMPARE(toDevice("fits.bin", "/nowhere/m.bin"), int(PortlexError::NotFound));
+        QCOMPARE(toDevice("fits.bin", "/user/notes.txt/m.bin"), int(PortlexError::NotFound));
         QCOMPARE(treeDigest(flash()), before);
         QCOMPARE(toDevice("fits.bin", "/user/fits.bin"), 0);
 

@@ -17,6 +17,8 @@
 #include <QTemporaryDir>
 #include <QtTest>
 
+#include <unistd.h>
+
 Q_DECLARE_METATYPE(MifEntry)
 
 namespace {
@@ -393,8 +395,10 @@ private slots:
         QDesktopServices::unsetUrlHandler("file");
         qputenv("TMPDIR", previous);
 
-        const QString local = temporary.filePath(name);
-        QCOMPARE(TestSupport::treeEntries(temporary.path()), opens.isEmpty() ? QStringList() : QStringList(name));
+        // In this user's own folder below the temporary one.
+        const QString folder = temporary.filePath("delvix-" + QString::number(::geteuid()));
+        const QString local = folder + "/" + name;
+        QCOMPARE(TestSupport::treeEntries(folder), opens.isEmpty() ? QStringList() : QStringList(name));
         QCOMPARE(desktop.opened, opens == "desktop" ? QList<QUrl>({QUrl::fromLocalFile(local)}) : QList<QUrl>());
         if (!opens.startsWith("Module")) {
             QCOMPARE(openDialogs().size(), 0);
