@@ -87,7 +87,6 @@ private slots:
     {
         QTest::addColumn<QRect>("stored");
         QTest::addColumn<QPoint>("expected");
-        QTest::newRow("far off every screen") << QRect(5000, 5000, 900, 600) << QPoint(40, 40);
         QTest::newRow("near the right edge of the first") << QRect(1900, 100, 900, 600) << QPoint(1900, 100);
         QTest::newRow("on the second screen") << QRect(2500, 300, 400, 300) << QPoint(2500, 300);
         QTest::newRow("below the second screen") << QRect(2000, 1100, 400, 300) << QPoint(40, 40);

@@ -21,11 +21,6 @@ DeviceCache numberedClasses(int count)
     return cacheOf(classes);
 }
 
-int threadCount()
-{
-    return QDir("/proc/self/task").entryList(QDir::Dirs | QDir::NoDotAndDotDot).size();
-}
-
 } // namespace
 
 // The class id list page on records built here, and its export of the classes a real
@@ -163,13 +158,13 @@ private slots:
     {
         // Far more than teardown waits for: only a worker that stops ends in time.
         DeviceCache cache = numberedClasses(20000);
-        const int threads = threadCount();
+        const int threads = TestSupport::threadCount();
         auto page = std::make_unique<ClassListView>();
         page->setDeviceRecord(&cache);
         QVERIFY(tickUntil(*page, [&] { return page->_classIDTable->rowCount() > 0; }));
-        QVERIFY(threadCount() > threads);
+        QVERIFY(TestSupport::threadCount() > threads);
         page.reset();
-        QTRY_COMPARE(threadCount(), threads);
+        QTRY_COMPARE(TestSupport::threadCount(), threads);
     }
 
 private:

@@ -1,12 +1,10 @@
 #include "CITreeWidgetItem.h"
-#include "DeviceWindow.h"
 #include "ISettingsTreeView.h"
 #include "ISettingsTreeViewThread.h"
 #include "PageFixtures.h"
 #include "Portlex.h"
 #include "SimulatorProcess.h"
 
-#include <QLineEdit>
 #include <QTemporaryDir>
 
 using namespace PageFixtures;
@@ -157,7 +155,6 @@ private slots:
         QTest::addColumn<QString>("status");
         QTest::newRow("none") << QString() << QString() << "Ready";
         QTest::newRow("0xDEADBEEF at the root") << "/" << "0xDEADBEEF" << "Ready";
-        QTest::newRow("0xDEADBEEF early") << "/ztoversion" << "0xDEADBEEF" << "Ready";
         QTest::newRow("error among the 11s") << "/alpha/a02" << "5" << "Error: 5";
         QTest::newRow("error at oattest") << "/OATtest" << "0x10" << "Error: 16";
     }
@@ -218,20 +215,6 @@ private slots:
         QVERIFY(!page.pacer().isArmed());
         page.startComponent("settings");
         QVERIFY(tickUntil(page, [&page] { return page.state() == GatewayComponentWidget::Complete; }));
-    }
-
-    // In a device window the completed page may be searched but has nothing to export.
-    void shownInTheWindow()
-    {
-        DeviceWindow window;
-        window.setAttribute(Qt::WA_DeleteOnClose, false);
-        window.setDevice("settings");
-        window.action_ISettings->trigger();
-        QTRY_COMPARE_WITH_TIMEOUT(window._settingsTreeView->state(), GatewayComponentWidget::Complete, 30000);
-        QVERIFY(window.findChild<QLineEdit*>()->isEnabled());
-        QVERIFY(!window.actionExport_to_XML->isEnabled());
-        QVERIFY(window._settingsTreeView->search("zeta"));
-        QVERIFY(itemAt(window._settingsTreeView->_settingsTree, "/Zeta")->isSelected());
     }
 
 private:

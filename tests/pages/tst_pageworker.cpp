@@ -238,12 +238,24 @@ private slots:
         FetchingPage page(device);
         QSignalSpy states(&page, &GatewayComponentWidget::stateChanged);
         page.startComponent("device");
+        // One worker per page, at the priority the page asks for.
+        PageWorkerThread* worker = page.worker.thread();
+        page.startComponent("device");
+        QCOMPARE(page.worker.thread(), worker);
+        QCOMPARE(worker->priority(), QThread::LowPriority);
+        page.raisePriority();
+        QCOMPARE(worker->priority(), QThread::HighestPriority);
+        page.lowerPriority();
+        QCOMPARE(worker->priority(), QThread::LowestPriority);
         for (int i = 0; i < 3; ++i)
             page.onTimeElapse();
         QVERIFY(page.pacer.isArmed());
         QCOMPARE(page.status(), QString("Starting"));
         device->answer(result, records);
         QTRY_VERIFY(!page.worker.isRunning());
+        // A worker that has ended keeps its last priority, without a warning.
+        QTest::failOnWarning(QRegularExpression(".*"));
+        page.raisePriority();
         for (int tick = 1; tick <= 3; ++tick) {
             page.onTimeElapse();
             QCOMPARE(page.rows, result ? QStringList() : records.mid(0, tick));
@@ -252,26 +264,6 @@ private slots:
         }
         QCOMPARE(page.status(), status);
         QCOMPARE(PageFixtures::signalTexts(states), (result ? QStringList{"Failed"} : QStringList{"Processing", "Complete"}));
-    }
-
-    void oneWorkerPerPageAndPriorities()
-    {
-        auto device = QSharedPointer<FakeDevice>::create();
-        FetchingPage page(device);
-        page.startComponent("device");
-        PageWorkerThread* first = page.worker.thread();
-        page.startComponent("device");
-        QCOMPARE(page.worker.thread(), first);
-        QCOMPARE(first->priority(), QThread::LowPriority);
-        page.raisePriority();
-        QCOMPARE(first->priority(), QThread::HighestPriority);
-        page.lowerPriority();
-        QCOMPARE(first->priority(), QThread::LowestPriority);
-        // A worker that has ended keeps its last priority, without a warning.
-        device->answer(0, {});
-        QTRY_VERIFY(!page.worker.isRunning());
-        QTest::failOnWarning(QRegularExpression(".*"));
-        page.raisePriority();
     }
 
     // A worker stuck in a device call when its page goes: teardown waits a bounded time; the

@@ -234,7 +234,6 @@ private slots:
         QCOMPARE(page._level1Tree->topLevelItemCount(), 0);
     }
 
-
     void formatSize()
     {
         const QList<QPair<quint64, QString>> sizes = {
