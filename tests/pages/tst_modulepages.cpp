@@ -34,8 +34,8 @@ const QByteArray RegistryVolume = " modules=\"sys/mod usermod\" install=\"usermo
 
 } // namespace
 
-// The module list and registry pages against real simulators: a small module image, one
-// device failing the module query, and the sample device for the registry's export.
+// The module list and registry pages against real simulators: a small module image, the
+// sample device for the registry's export, and devices failing their queries.
 class TestModulePages : public QObject
 {
     Q_OBJECT

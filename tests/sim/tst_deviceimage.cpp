@@ -56,8 +56,7 @@ enum ConnectState { NeverSent, Refused, FailedByRule, RefusedLater };
 // The device model built from an image (profile, modules, classes, registry, settings,
 // volumes, enablement), the request handler's own rules, and the rules the device keeps for
 // itself: read-only system module folders, names kept for its own temporary files, Connect
-// before anything else, reservations that expire, rescans that read only what changed (and
-// no huge MIF) and keep-alives while unpacking.
+// before anything else, reservations that expire and keep-alives while unpacking.
 class TestDeviceImage : public QObject
 {
     Q_OBJECT
