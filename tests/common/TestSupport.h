@@ -1,7 +1,7 @@
 #pragma once
 
-// Small helpers shared by the tests: files, tree digests, seeded bytes, calls from a worker
-// thread and stale sockets. Header-only so that every test folder can use it.
+// Small helpers shared by the tests: files, tree digests, seeded bytes, thread counts, calls
+// from a worker thread and stale sockets. Header-only so that every test folder can use it.
 
 #include <QByteArray>
 #include <QCryptographicHash>
@@ -75,6 +75,12 @@ inline QByteArray randomBytes(qsizetype size, quint32 seed)
     for (qsizetype i = size / 4 * 4; i < size; ++i)
         bytes[i] = char(generator.generate());
     return bytes;
+}
+
+// The threads this process runs now.
+inline int threadCount()
+{
+    return QDir(QStringLiteral("/proc/self/task")).entryList(QDir::Dirs | QDir::NoDotAndDotDot).size();
 }
 
 // Runs work on a thread of its own, as the pages' workers call the gateway; a call that

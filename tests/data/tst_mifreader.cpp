@@ -315,23 +315,6 @@ private slots:
         QTemporaryDir dir;
         QVERIFY(TestSupport::writeFile(dir.filePath("broken.mif"), data) && !reader.readFile(dir.filePath("broken.mif")));
     }
-
-    // The most a file can claim: a full table of entries that each cover every id; the writer
-    // refuses one entry more.
-    void widestCoverage()
-    {
-        MifWriter writer;
-        for (int k = 0; k <= 0xFFFF; ++k)
-            writer.addBlob(k == 0xFFFF ? QByteArray("top") : QByteArray());
-        for (int i = 0; i < MaxEntries - 1; ++i)
-            writer.addEntry(1, 0, 0xFFFF, 0);
-        QVERIFY(writer.addEntry(2, 40000, 0, 7) && !writer.addEntry(3, 0, 0, 0));
-        MifReader reader;
-        QVERIFY2(reader.readData(writer.data()), qPrintable(reader.errorString()));
-        QCOMPARE(reader.entryCount(), MaxEntries);
-        QCOMPARE(reader.resource(1, 0xFFFF), QByteArray("top"));
-        QVERIFY(reader.hasResource(2, 40000) && !reader.hasResource(2, 40001));
-    }
 };
 
 QTEST_GUILESS_MAIN(TestMifReader)

@@ -14,7 +14,6 @@
 #include <QtEndian>
 #include <QtTest>
 
-#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
@@ -22,7 +21,6 @@
 
 #include <atomic>
 #include <functional>
-#include <vector>
 
 using namespace TestSupport;
 
@@ -31,7 +29,7 @@ namespace {
 constexpr quint64 CopySize = 3 * Protocol::TransferChunkSize;
 constexpr quint32 TransferId = 7;
 // What the socket folder is, or (from File on) what already sits at the socket path.
-enum Place { Missing, Folder, Link, Foreign, File, FileLink, Directory, StaleSocket, ForeignPeer };
+enum Place { Missing, Folder, Link, Foreign, File, FileLink, StaleSocket, ForeignPeer };
 
 // The device: GetVolumes answers 7, GetRegistry fails with 3, a download streams streamSize
 // bytes, every stream hangs at its piece hangAtChunk, RunApplication works long.
@@ -445,45 +443,6 @@ private slots:
         ::close(second);
     }
 
-    void outOfDescriptorsKeepsListening()
-    {
-        Device device(m_socketPath);
-        rlimit saved {};
-        QVERIFY(::getrlimit(RLIMIT_NOFILE, &saved) == 0);
-        int highest = 0;
-        for (const QString& fd : QDir(QStringLiteral("/proc/self/fd")).entryList(QDir::AllEntries | QDir::System | QDir::NoDotAndDotDot))
-            highest = std::max(highest, fd.toInt());
-        // Hold the device while this process's descriptors run out, so that its next accept fails.
-        QSemaphore entered, gate;
-        device.onDevice([&] { entered.release(); gate.acquire(); }, Qt::QueuedConnection);
-        entered.acquire();
-        bool held = true;
-        const auto restore = qScopeGuard([&] {
-            if (held)
-                gate.release();
-            ::setrlimit(RLIMIT_NOFILE, &saved);
-        });
-        rlimit lowered = saved;
-        lowered.rlim_cur = rlim_t(highest + 16);
-        QVERIFY(::setrlimit(RLIMIT_NOFILE, &lowered) == 0);
-        std::vector<int> clients;
-        for (int fd; (fd = rawSocket(m_socketPath)) >= 0;)
-            clients.push_back(fd);
-        QCOMPARE(errno, EMFILE);
-
-        QTest::ignoreMessage(QtWarningMsg, QRegularExpression(QStringLiteral("Refusing new connections.*out of file descriptors")));
-        gate.release();
-        held = false;
-        // Every waiting client is closed at once rather than left waiting for a handshake.
-        char byte;
-        QTRY_VERIFY(std::all_of(clients.begin(), clients.end(), [&](int fd) { return ::recv(fd, &byte, 1, MSG_DONTWAIT) == 0; }));
-        for (const int fd : clients)
-            ::close(fd);
-        QVERIFY(::setrlimit(RLIMIT_NOFILE, &saved) == 0);
-        QTest::ignoreMessage(QtWarningMsg, QRegularExpression(QStringLiteral("again, after refusing")));
-        QCOMPARE(call(m_socketPath, Operation::GetVolumes), 0);
-    }
-
     // A device that stops answering in the middle of a transfer costs the caller one timeout:
     // no clean-up call goes after it, so the next caller's connection is the first the device
     // has seen since the transfer's.
@@ -547,7 +506,6 @@ private slots:
         QTest::newRow("another user's folder") << int(Foreign) << 0700 << untrusted;
         QTest::newRow("regular file at the socket path") << int(File) << 0700 << unreachable;
         QTest::newRow("symlink at the socket path") << int(FileLink) << 0700 << unreachable;
-        QTest::newRow("directory at the socket path") << int(Directory) << 0700 << unreachable;
         QTest::newRow("stale socket, replaced") << int(StaleSocket) << 0700 << 0;
         QTest::newRow("another user's device at the socket path") << int(ForeignPeer) << 0700 << untrusted;
     }
@@ -566,7 +524,6 @@ private slots:
         QVERIFY(place != Link || QFile::link(m_folder, m_dir->filePath(QStringLiteral("link"))));
         QVERIFY(place != File || writeFile(m_socketPath, "keep me"));
         QVERIFY(place != FileLink || (writeFile(target, "keep me") && QFile::link(target, m_socketPath)));
-        QVERIFY(place != Directory || QDir().mkpath(m_socketPath + QStringLiteral("/inside")));
         QVERIFY(place != StaleSocket || makeStaleSocket(m_socketPath));
         const int listener = place == ForeignPeer ? rawSocket(m_socketPath, true, 65534) : -1;
         const auto closeListener = qScopeGuard([listener] { ::close(listener); });

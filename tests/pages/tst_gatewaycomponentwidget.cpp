@@ -187,7 +187,6 @@ private slots:
         QTest::newRow("case ignored") << 0 << 0 << "apple" << 0 << "Banana" << -1;
         QTest::newRow("same text in other case") << 0 << 0 << "Media" << 0 << "media" << 0;
         QTest::newRow("ids as text") << 0 << 0 << "0x10" << 0 << "0x9" << -1;
-        QTest::newRow("versions as text") << 0 << 0 << "10.0" << 0 << "9.0" << -1;
         QTest::newRow("empty first") << 0 << 0 << "" << 0 << "a" << -1;
         QTest::newRow("non-ASCII without case") << 0 << 0 << "Ärger" << 0 << "ärmel" << -1;
         QTest::newRow("type before text") << 0 << 2 << "a" << 1 << "z" << 1;

@@ -1,12 +1,10 @@
 #include "CITreeWidgetItem.h"
-#include "DeviceWindow.h"
 #include "ISettingsTreeView.h"
 #include "ISettingsTreeViewThread.h"
 #include "PageFixtures.h"
 #include "Portlex.h"
 #include "SimulatorProcess.h"
 
-#include <QLineEdit>
 #include <QTemporaryDir>
 
 using namespace PageFixtures;
@@ -97,8 +95,8 @@ QStringList readNodes(const QTreeWidget* tree)
 
 } // namespace
 
-// The settings tree page: the crawl's priorities, order and end, the name/value table, and
-// the page in a device window, against real simulators.
+// The settings tree page against real simulators: the crawl's priorities, order and end, and
+// the name/value table.
 class TestISettingsTreeView : public QObject
 {
     Q_OBJECT
@@ -157,7 +155,6 @@ private slots:
         QTest::addColumn<QString>("status");
         QTest::newRow("none") << QString() << QString() << "Ready";
         QTest::newRow("0xDEADBEEF at the root") << "/" << "0xDEADBEEF" << "Ready";
-        QTest::newRow("0xDEADBEEF early") << "/ztoversion" << "0xDEADBEEF" << "Ready";
         QTest::newRow("error among the 11s") << "/alpha/a02" << "5" << "Error: 5";
         QTest::newRow("error at oattest") << "/OATtest" << "0x10" << "Error: 16";
     }
@@ -190,11 +187,16 @@ private slots:
         }
     }
 
-    // Choosing a node with values lists them by name, the names not selectable; a node
+    // An id the gateway does not know starts nothing; showing the page again tries again.
+    // Then choosing a node with values lists them by name, the names not selectable; a node
     // without values empties the table.
     void selectedNodeShowsItsValues()
     {
         ISettingsTreeView page;
+        page.startComponent("missing");
+        QCOMPARE(page.status(), QString("Device not found"));
+        QCOMPARE(page.state(), GatewayComponentWidget::Starting);
+        QVERIFY(!page.pacer().isArmed());
         page.startComponent("settings");
         QVERIFY(tickUntil(page, [&page] { return page.state() == GatewayComponentWidget::Complete; }));
         QTableWidget* table = page._nameValueTable;
@@ -206,32 +208,6 @@ private slots:
         QCOMPARE(table->rowCount(), 0);
         page._settingsTree->setCurrentItem(itemAt(page._settingsTree, "/alpha/a01/sub"));
         QCOMPARE(columnTexts(table, 1), QStringList("sub"));
-    }
-
-    // An id the gateway does not know starts nothing; showing the page again tries again.
-    void unknownDeviceThenKnown()
-    {
-        ISettingsTreeView page;
-        page.startComponent("missing");
-        QCOMPARE(page.status(), QString("Device not found"));
-        QCOMPARE(page.state(), GatewayComponentWidget::Starting);
-        QVERIFY(!page.pacer().isArmed());
-        page.startComponent("settings");
-        QVERIFY(tickUntil(page, [&page] { return page.state() == GatewayComponentWidget::Complete; }));
-    }
-
-    // In a device window the completed page may be searched but has nothing to export.
-    void shownInTheWindow()
-    {
-        DeviceWindow window;
-        window.setAttribute(Qt::WA_DeleteOnClose, false);
-        window.setDevice("settings");
-        window.action_ISettings->trigger();
-        QTRY_COMPARE_WITH_TIMEOUT(window._settingsTreeView->state(), GatewayComponentWidget::Complete, 30000);
-        QVERIFY(window.findChild<QLineEdit*>()->isEnabled());
-        QVERIFY(!window.actionExport_to_XML->isEnabled());
-        QVERIFY(window._settingsTreeView->search("zeta"));
-        QVERIFY(itemAt(window._settingsTreeView->_settingsTree, "/Zeta")->isSelected());
     }
 
 private:

@@ -1,4 +1,3 @@
-#include "DeviceWindow.h"
 #include "ModuleListView.h"
 #include "PageFixtures.h"
 #include "Portlex.h"
@@ -6,8 +5,6 @@
 #include "SimulatorProcess.h"
 #include "_ZantDevice.h"
 
-#include <QLabel>
-#include <QLineEdit>
 #include <QSignalSpy>
 #include <QTemporaryDir>
 
@@ -37,8 +34,8 @@ const QByteArray RegistryVolume = " modules=\"sys/mod usermod\" install=\"usermo
 
 } // namespace
 
-// The module list and registry pages against real simulators: a small module image, one
-// device failing the module query, and the sample device for the registry's export.
+// The module list and registry pages against real simulators: a small module image, the
+// sample device for the registry's export, and devices failing their queries.
 class TestModulePages : public QObject
 {
     Q_OBJECT
@@ -53,7 +50,6 @@ private slots:
                                + module("plain", "2.0", "Library", "maker", "P")));
         m_device = m_simulator.connectDevice(m_image.path(), "modules");
         QVERIFY(m_device);
-        QVERIFY(m_failing.connectDevice(m_image.path(), "failing-modules", {"--fail", "GetModules=3"}));
         QVERIFY(m_sample.connectDevice(SimulatorProcess::sampleImage("simulator"), "registry"));
     }
 
@@ -61,20 +57,6 @@ private slots:
     {
         m_device.reset();
         Portlex::Destroy();
-    }
-
-    // Left to its own timer: the tick goes on polling an empty table.
-    void failedQueryKeepsPolling()
-    {
-        ModuleListView page;
-        QSignalSpy ticks(&page.pacer(), &TickPacer::timeout);
-        page.startComponent("failing-modules");
-        QTRY_COMPARE(page.status(), QString("Error: 3"));
-        QCOMPARE(page.state(), GatewayComponentWidget::Failed);
-        QTRY_VERIFY(ticks.count() >= 2);
-        QVERIFY(page.pacer().isArmed());
-        QCOMPARE(page._moduleTable->rowCount(), 0);
-        QVERIFY(!page.isComplete() && !page.canSearch());
     }
 
     // The export follows the table's order, escapes, and is frozen at its first call, even
@@ -141,7 +123,6 @@ private slots:
         QCOMPARE(doubles.count(), 1);
     }
 
-
     // Left to its own timer. The rows come sorted by class type as text, equal ones in the
     // device's order.
     void exportOfTheSimulator()
@@ -177,31 +158,46 @@ private slots:
 
     // A failed query leaves its text and an empty table; the tick goes on polling, and the
     // page never completes.
-    void failedQueryNeverCompletes_data()
+    void failedQueryKeepsPolling_data()
     {
-        QTest::addColumn<QString>("code");
+        QTest::addColumn<bool>("registry");
+        QTest::addColumn<QString>("rule");
         QTest::addColumn<QString>("status");
-        QTest::newRow("no registry object") << "3" << "Registry Object is not available in DelvixStubs.dll1";
-        QTest::newRow("negative code") << "0xDEADBEEF" << "Error: -559038737";
+        QTest::addColumn<GatewayComponentWidget::ComponentState>("state");
+        QTest::newRow("module list") << false << "GetModules=3" << "Error: 3" << GatewayComponentWidget::Failed;
+        QTest::newRow("no registry object") << true << "GetRegistry=3" << "Registry Object is not available in DelvixStubs.dll1"
+                                            << GatewayComponentWidget::Starting;
+        QTest::newRow("negative registry code") << true << "GetRegistry=0xDEADBEEF" << "Error: -559038737"
+                                                << GatewayComponentWidget::Starting;
     }
 
-    void failedQueryNeverCompletes()
+    void failedQueryKeepsPolling()
     {
-        QFETCH(QString, code);
+        QFETCH(bool, registry);
+        QFETCH(QString, rule);
         QFETCH(QString, status);
+        QFETCH(GatewayComponentWidget::ComponentState, state);
         SimulatorProcess failing(m_sockets.path());
-        QVERIFY(failing.connectDevice(SimulatorProcess::sampleImage("simulator"), "failing", {"--fail", "GetRegistry=" + code}));
-        RegistryListView page;
-        QSignalSpy ticks(&page.pacer(), &TickPacer::timeout);
-        page.startComponent("failing");
-        QTRY_COMPARE(page.status(), status);
-        const int ticksAtFailure = int(ticks.count());
-        QTRY_VERIFY_WITH_TIMEOUT(ticks.count() >= ticksAtFailure + 2, 5000);
-        QVERIFY(page.pacer().isArmed());
-        QCOMPARE(page._registryTable->rowCount(), 0);
-        QCOMPARE(page.status(), status);
-        QVERIFY(!page.isComplete() && !page.canSearch());
-        QCOMPARE(page.state(), GatewayComponentWidget::Starting);
+        QVERIFY(failing.connectDevice(SimulatorProcess::sampleImage("simulator"), "failing", {"--fail", rule}));
+        const auto check = [&](auto& page, const QTableWidget* table) {
+            QSignalSpy ticks(&page.pacer(), &TickPacer::timeout);
+            page.startComponent("failing");
+            QTRY_COMPARE(page.status(), status);
+            const int ticksAtFailure = int(ticks.count());
+            QTRY_VERIFY_WITH_TIMEOUT(ticks.count() >= ticksAtFailure + 2, 5000);
+            QVERIFY(page.pacer().isArmed());
+            QCOMPARE(table->rowCount(), 0);
+            QCOMPARE(page.status(), status);
+            QCOMPARE(page.state(), state);
+            QVERIFY(!page.isComplete() && !page.canSearch());
+        };
+        if (registry) {
+            RegistryListView page;
+            check(page, page._registryTable);
+        } else {
+            ModuleListView page;
+            check(page, page._moduleTable);
+        }
     }
 
     // A device without entries still completes; with no row there is nothing to search.
@@ -242,24 +238,10 @@ private slots:
         QCOMPARE(singles.count() + doubles.count(), 2);
     }
 
-    // Chosen in a device window, the page starts, completes and may be searched and exported.
-    void shownInTheWindow()
-    {
-        DeviceWindow window;
-        window.setAttribute(Qt::WA_DeleteOnClose, false);
-        window.setDevice("registry");
-        window.action_Registry->trigger();
-        QTRY_VERIFY_WITH_TIMEOUT(window._registryListView->isComplete(), 30000);
-        QVERIFY(window.actionExport_to_XML->isEnabled());
-        QVERIFY(window.findChild<QLineEdit*>()->isEnabled());
-        QCOMPARE(window.findChild<QLabel*>("_status")->text(), QString("Ready"));
-    }
-
 private:
     QTemporaryDir m_sockets;
     QTemporaryDir m_image;
     SimulatorProcess m_simulator{m_sockets.path()};
-    SimulatorProcess m_failing{m_sockets.path()};
     SimulatorProcess m_sample{m_sockets.path()};
     QSharedPointer<_ZantDevice> m_device;
 };

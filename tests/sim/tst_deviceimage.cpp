@@ -56,8 +56,7 @@ enum ConnectState { NeverSent, Refused, FailedByRule, RefusedLater };
 // The device model built from an image (profile, modules, classes, registry, settings,
 // volumes, enablement), the request handler's own rules, and the rules the device keeps for
 // itself: read-only system module folders, names kept for its own temporary files, Connect
-// before anything else, reservations that expire, rescans that read only what changed (and
-// no huge MIF) and keep-alives while unpacking.
+// before anything else, reservations that expire and keep-alives while unpacking.
 class TestDeviceImage : public QObject
 {
     Q_OBJECT
@@ -290,7 +289,6 @@ private slots:
         QCOMPARE(handle(Operation::Connect).result, 0);
         QCOMPARE(handle(Operation::GetChildSettings).result, qint32(PortlexError::BadRequest));
         QCOMPARE(handle(Operation::GetFileSystemLevel, QByteArray("\xff\xff\xff", 3)).result, qint32(PortlexError::BadRequest));
-        QCOMPARE(handle(Operation::GetFileSystemLevel, pack(QStringLiteral("/../.."))).result, qint32(PortlexError::PathRefused));
         QCOMPARE(handle(Operation(9999)).result, qint32(PortlexError::UnknownOperation));
         // A lock flag locks only its own mode, before the request that carries it is answered.
         const auto status = [this](Protocol::RequestFlags flags) { return leading<qint32>(handle(Operation::TepStatus, {}, 1, flags)); };
@@ -399,53 +397,6 @@ private slots:
         QString mode, owner, expires;
         QCOMPARE(state().tepStatus(mode, owner, expires), EnablementEnabled); // the lock request was not applied
         QCOMPARE(handle(Operation::GetVolumes, {}, 2).result, 0); // a refusal is no one else's
-    }
-
-    // Told of changed files, the device reads again only the MIFs that changed, and none too large.
-    void catalogReadsOnlyWhatChanged()
-    {
-        const auto reads = [this] { return state().catalog().mifReads(); };
-        QCOMPARE(reads(), 2); // sysm and userm, once each
-        QCOMPARE(upload(QStringLiteral("/user/song.mp3"), "la").result, 0);
-        QCOMPARE(reads(), 2);
-
-        // A new module and a changed one: nothing changes until the device is told; then both
-        // count everywhere, the registry in module order.
-        const quint64 freeBefore = state().volumes().at(0).freeSpace;
-        m_image->addModule(QStringLiteral("flash/usermod/pager"), TestImage::module(QStringLiteral("pager"), {0x01011002},
-                           {{0x01011002, 0x01011001, QStringLiteral("application/x-page")}}));
-        const auto putUserModule = [this] {
-            m_image->addModule(QStringLiteral("flash/usermod/userm"), TestImage::module(QStringLiteral("userm"), {0x01013001}));
-        };
-        putUserModule();
-        QCOMPARE(state().modules().size(), 2);
-        state().filesChanged();
-        QCOMPARE(reads(), 4);
-        QCOMPARE(state().modules().size(), 3);
-        const DeviceCache cache = state().cache();
-        QCOMPARE(cache.classes.value(QStringLiteral("0x01011002")).source, "/usermod/pager/pager.mif");
-        QVERIFY(!cache.classes.contains(QStringLiteral("0x7F000001"))); // gone with the old userm.mif
-        QCOMPARE(texts(state().registry(), [](const RegistryInfo& r) { return r.mimeType; }), (QStringList {"text/plain", "application/x-page"}));
-        QVERIFY(state().volumes().at(0).freeSpace < freeBefore);
-        QCOMPARE(act(Operation::DeleteDeviceFile, pack(QStringLiteral("/usermod/userm"))).result, 0);
-        QCOMPARE(reads(), 4);
-        QCOMPARE(state().modules().size(), 2);
-        putUserModule();
-        state().filesChanged();
-        QCOMPARE(reads(), 5); // a module put back is read again
-
-        // A MIF above the limit is listed but never read; sparse files take no room.
-        QVERIFY(QDir().mkpath(flash(QStringLiteral("usermod/big"))));
-        QFile mif(flash(QStringLiteral("usermod/big/big.mif")));
-        QVERIFY(mif.open(QIODevice::WriteOnly) && mif.resize(ModuleCatalog::MaxMifSize));
-        state().filesChanged();
-        QCOMPARE(reads(), 6);
-        QVERIFY(mif.resize(ModuleCatalog::MaxMifSize + 1));
-        QTest::ignoreMessage(QtWarningMsg, QRegularExpression(QStringLiteral("Not reading .*big\\.mif")));
-        state().filesChanged();
-        QCOMPARE(reads(), 6);
-        MifEntry entry;
-        QCOMPARE(state().moduleMif(QStringLiteral("big"), entry), qint32(PortlexError::IoError));
     }
 
     // The extractor's heartbeats reach the keep-alive of the device's request, for large

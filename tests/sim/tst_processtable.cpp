@@ -34,72 +34,45 @@ class TestProcessTable : public QObject
     Q_OBJECT
 
 private slots:
-    // Residents stay, short-lived processes, threads and on-demand modules come and go, and
-    // ids always ascend: whatever appears has an id above every id seen before.
+    // Residents stay while short-lived processes, threads and on-demand modules come and go;
+    // whatever appears has an id above every id seen before (processes and threads share one space).
     void lifeGoesOnWithAscendingIds()
     {
         ProcessTable table(Residents, Transients, evolution(true));
-        const ProcessTable::Process kernel = table.processes().first();
-        QCOMPARE(kernel.modules.size(), 1); // on-demand modules start unloaded
-        QSet<quint32> live[2], processIds, kernelThreads; // [0] processes and threads (one id space), [1] modules
+        const quint32 kernel = table.processes().first().id;
+        QSet<quint32> live[2], seen[2];
         quint32 highest[2] = {};
-        bool moduleLoaded = false, threadEnded = false;
         for (quint64 step = 0; step <= 400; table.advanceTo(++step)) {
             QSet<quint32> now[2];
-            quint32 previousProcess = 0;
             for (const ProcessTable::Process& p : table.processes()) {
-                QList<quint32> ids[2] = {{p.id}, {}};
+                now[0] << p.id;
                 for (const ProcessTable::Thread& t : p.threads)
-                    ids[0] << t.id;
+                    now[0] << t.id;
                 for (const ProcessTable::Module& m : p.modules)
-                    ids[1] << m.id;
-                for (int kind : {0, 1}) {
-                    for (int i = 0; i < ids[kind].size(); ++i) {
-                        const quint32 id = ids[kind][i];
-                        QVERIFY2((i == 0 || id > ids[kind][i - 1]) && (live[kind].contains(id) || id > highest[kind]),
-                                 qPrintable(snapshot(table)));
-                        now[kind].insert(id);
-                    }
-                }
-                QVERIFY(p.id > previousProcess && p.threads.size() <= 2 + ProcessTable::MaxDynamicThreads);
-                previousProcess = p.id;
-                processIds.insert(p.id);
-                moduleLoaded = moduleLoaded || p.modules.size() > 1;
+                    now[1] << m.id;
             }
-            for (int kind : {0, 1})
+            for (int kind : {0, 1}) {
+                for (const quint32 id : std::as_const(now[kind]))
+                    QVERIFY2(live[kind].contains(id) || id > highest[kind], qPrintable(snapshot(table)));
                 highest[kind] = std::max(highest[kind], *std::max_element(now[kind].cbegin(), now[kind].cend()));
-            QVERIFY(table.processes().size() <= 6);
-            const ProcessTable::Process& resident = table.processes().first();
-            QCOMPARE(qMakePair(resident.id, resident.threads.first().id), qMakePair(kernel.id, kernel.threads.first().id));
+                seen[kind] += now[kind];
+            }
+            QCOMPARE(table.processes().first().id, kernel);
             QCOMPARE(table.processes().at(1).name, "Shell");
-            QSet<quint32> threads;
-            for (const ProcessTable::Thread& t : resident.threads)
-                threads.insert(t.id);
-            threadEnded = threadEnded || !(kernelThreads - threads).isEmpty();
-            kernelThreads = threads;
             std::swap(live, now);
         }
-        QVERIFY(processIds.size() > 10 && moduleLoaded && threadEnded);
-    }
+        QVERIFY2(seen[0].size() > 40 && seen[1].size() > 4, qPrintable(QStringLiteral("%1 %2").arg(seen[0].size()).arg(seen[1].size())));
 
-    void sameSeedSameHistory()
-    {
-        ProcessTable tables[] = {{Residents, Transients, evolution(true, 7)}, {Residents, Transients, evolution(true, 7)},
-                                 {Residents, Transients, evolution(true, 8)}};
-        QStringList history[3];
-        for (quint64 step = 1; step <= 60; ++step) {
-            for (int i = 0; i < 3; ++i) {
-                tables[i].advanceTo(step);
-                history[i] << snapshot(tables[i]);
-            }
-        }
-        QCOMPARE(history[0], history[1]);
-        QVERIFY(history[0] != history[2]);
-        // Steps already run are never run again.
-        tables[0].advanceTo(10);
-        tables[0].advanceTo(60);
-        QCOMPARE(tables[0].currentStep(), 60u);
-        QCOMPARE(snapshot(tables[0]), history[0].last());
+        // The same seed gives the same history in one jump, another seed another; steps
+        // already run are never run again.
+        ProcessTable twin(Residents, Transients, evolution(true)), other(Residents, Transients, evolution(true, 8));
+        twin.advanceTo(401);
+        other.advanceTo(401);
+        QCOMPARE(snapshot(twin), snapshot(table));
+        QVERIFY(snapshot(other) != snapshot(table));
+        table.advanceTo(10);
+        QCOMPARE(table.currentStep(), 401u);
+        QCOMPARE(snapshot(table), snapshot(twin));
     }
 
     void withoutEvolutionOnlyShortLivedProcessesEnd()

@@ -148,9 +148,7 @@ private slots:
             {"--image", "/i", "--turbo"},
             {"--image", "/i", "--id", "../x"},
             {"--image", "/i", "--latency", "-1"},
-            {"--image", "/i", "--refuse-connect", "5"}, // no text
             {"--image", "/i", "--refuse-connect", "0:ok"},
-            {"--image", "/i", "--fail", "GetRegistry"},
             {"generate", "--modules", "5"}, // no folder
             {"generate", "out", "--files", "-5"},
             {"make-sample", "desc.xml"},
