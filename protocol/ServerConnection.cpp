@@ -74,7 +74,7 @@ void ServerConnection::onReadyRead()
     while (!m_closing) {
         // A client that does not take its answers gets no more served; what it sends
         // meanwhile waits in the kernel.
-        m_paused = unsentBytes() > MaxUnsentBytes || (m_stream && isDownload(m_stream->request));
+        m_paused = unsentBytes() > MaxUnsentBytes || (m_stream && isDownload(m_stream->request)) || m_throttled;
         if (m_paused || m_socket->bytesAvailable() == 0)
             break;
         if (m_headerFill < Protocol::HeaderSize) {
@@ -84,8 +84,10 @@ void ServerConnection::onReadyRead()
         } else if (m_reading.flags & Protocol::DataFlag) {
             // File bytes go to the upload as they come, not gathered into frames first.
             const qint64 got = m_socket->read(m_piece.data(), std::min<qint64>(m_piece.size(), m_payloadLeft));
-            m_payloadLeft -= std::max<qint64>(got, 0);
-            receiveUpload(m_reading.requestId, m_piece.constData(), got);
+            if (got > 0) {
+                m_payloadLeft -= got;
+                receiveUpload(m_reading.requestId, m_piece.constData(), got);
+            }
         } else {
             const qint64 offset = m_reading.payload.size() - m_payloadLeft;
             m_payloadLeft -= std::max<qint64>(m_socket->read(m_reading.payload.data() + offset, m_payloadLeft), 0);
@@ -123,8 +125,16 @@ bool ServerConnection::finishFrame()
     m_headerFill = 0;
     if (m_reading.flags & Protocol::DataFlag) {
         // An empty one is the client's stop.
-        if (m_piece.isEmpty())
+        if (m_piece.isEmpty()) {
             receiveUpload(m_reading.requestId, nullptr, 0);
+        } else if (m_latencyMs > 0) {
+            // A slow device takes an upload's frames as slowly as it answers.
+            m_throttled = true;
+            QTimer::singleShot(m_latencyMs, this, [this] {
+                m_throttled = false;
+                onReadyRead();
+            });
+        }
         return true;
     }
     const bool open = dispatch(m_reading);
@@ -238,7 +248,7 @@ void ServerConnection::receiveUpload(quint32 requestId, const char* data, qint64
 {
     // Data of a stream answered already (refused early) is dropped, as the client may
     // still be finishing it.
-    if (size < 0 || !m_stream || isDownload(m_stream->request) || requestId != m_stream->request.requestId)
+    if (!m_stream || isDownload(m_stream->request) || requestId != m_stream->request.requestId)
         return;
     const qint32 result = m_handler->writeStream(m_id, m_stream->transferId, data, size);
     m_stream->expected -= std::min<quint64>(m_stream->expected, quint64(size));

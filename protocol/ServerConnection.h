@@ -44,6 +44,7 @@ private:
     // The stream requests, once the handler accepted them.
     void startStream(const Frame& request);
     void sendDownload();
+    // Bytes of a Data frame for the upload; none: the client stops it.
     void receiveUpload(quint32 requestId, const char* data, qint64 size);
     // Reading: a frame's header is complete; the frame is complete. False when the
     // connection closes.
@@ -87,6 +88,7 @@ private:
     QTimer m_halfOpenTimer;
     bool m_greeted = false;
     bool m_paused = false;  // reading stopped until the client takes its answers
+    bool m_throttled = false;  // reading an upload held back by the latency
     bool m_closing = false;
     bool m_reported = false;
 };
