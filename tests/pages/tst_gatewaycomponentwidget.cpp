@@ -4,7 +4,6 @@
 #include "StubPage.h"
 
 #include <QSignalSpy>
-#include <QThread>
 
 namespace {
 
@@ -62,7 +61,7 @@ QString marked(QTreeWidget& tree)
 
 } // namespace
 
-// What every page shares: the search and status duties, and the order of the table and tree
+// What every page shares: the search duty, and the order of the table and tree
 // items (item type first, for a tree only in its first column, then the text without regard
 // to letter case, ids and numbers as text).
 class TestGatewayComponentWidget : public QObject
@@ -70,41 +69,6 @@ class TestGatewayComponentWidget : public QObject
     Q_OBJECT
 
 private slots:
-    // A worker thread sets status and state, each value twice, while the GUI thread reads
-    // them; each change reaches a receiver on the GUI thread once, queued and in order.
-    void statusAndStateArriveOnceQueuedInOrder()
-    {
-        using State = GatewayComponentWidget::ComponentState;
-        SearchPage page;
-        QStringList statuses, expected;
-        QList<State> states;
-        bool onGuiThread = true;
-        connect(&page, &GatewayComponentWidget::statusChanged, this, [&](const QString& status) {
-            onGuiThread = onGuiThread && QThread::currentThread() == thread();
-            statuses.append(status);
-        });
-        connect(&page, &GatewayComponentWidget::stateChanged, this, [&](State state) { states.append(state); });
-        std::unique_ptr<QThread> emitter(QThread::create([&page] {
-            page.setStatus(QString());
-            for (int i = 1; i <= 200; ++i) {
-                page.setStatus(QString::number(i));
-                page.setStatus(QString::number(i));
-            }
-            for (State state : {State::Starting, State::Processing, State::Processing, State::Failed})
-                page.setState(state);
-        }));
-        emitter->start();
-        while (!emitter->isFinished()) {
-            const QString seen = page.status();
-            QVERIFY(seen.isEmpty() || (seen.toInt() >= 1 && seen.toInt() <= 200));
-        }
-        QTRY_COMPARE(states, (QList<State>{State::Processing, State::Failed}));
-        for (int i = 1; i <= 200; ++i)
-            expected.append(QString::number(i));
-        QCOMPARE(statuses, expected);
-        QVERIFY(onGuiThread);
-    }
-
     // Hits forming blocks, runs and single cells select exactly the hit cells.
     void tableSearch_data()
     {

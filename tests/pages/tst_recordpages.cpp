@@ -246,20 +246,9 @@ private slots:
         DeviceCache cache;
         DeviceData& data = cache.deviceData;
         data.phoneName = "<b>Kestrel</b> & co";
-        data.targetId = "0x00C0FFEE";
         data.zantVersion = "4.2.1";
-        data.zantBuildNumber = "4210";
-        data.staticBuildId = "S-77";
-        data.dynamicBuildId = "D-78";
-        data.componentServicesBuild = "CS 9.1";
-        data.hardware = {
-            {"Manufacturer", "Norvale"}, {"Model", "K-200"}, {"Firmware", "FW 1.0.7"}, {"ChipID", "NV6"},
-            {"PlatformID", "0x0A01"}, {"QXEVersion", "3.1"}, {"MobileID", "M-55"}, {"ColorDepth", "24"},
-            {"cxScreen", "240"}, {"cyScreen", "320"}, {"FlipPhone", "Yes"}, {"Vibrate", "yes"},
-            {"LocationSupport", "1"}, {"DeviceMDN", "5550100"}, {"IMEI", "490154203237518"}, {"RUIMID", "R-1"},
-            {"HWID", "HW-2"}, {"DeviceIDHash", "9f2c"}, {"HeapMemory", "10240"}, {"HeapFree", "9998"},
-            {"FSTotal", "lots"}, {"FSAvail", "-1"}, {"imei", "lower-case key"},
-        };
+        data.hardware = {{"Manufacturer", "Norvale"}, {"IMEI", "490154203237518"}, {"FlipPhone", "Yes"}, {"Vibrate", "yes"},
+                         {"HeapMemory", "10240"}, {"HeapFree", "9998"}, {"FSTotal", "lots"}, {"FSAvail", "-1"}};
         data.image = {{"PNG", "Yes"}, {"BMP", "Yes"}, {"JPEG", "No"}};
         data.video = {{"MPEG4", "Yes"}};
         PhoneInfoWidget page;
@@ -271,12 +260,8 @@ private slots:
         // Device texts are shown as they are, never as markup. Sizes: a number, the bytes
         // threshold, text that is no number, a negative count.
         const QList<QPair<const char*, QString>> labels = {
-            {"_manufacturer", "Norvale"}, {"_model", "K-200"}, {"_firmware", "FW 1.0.7"}, {"_chipID", "NV6"},
-            {"_platformID", "0x0A01"}, {"_qxeVersion", "3.1"}, {"_mobileID", "M-55"}, {"_colorDepth", "24"},
-            {"_screenWidth", "240"}, {"_screenHeight", "320"}, {"_mdn", "5550100"}, {"_imei", "490154203237518"},
-            {"_ruimid", "R-1"}, {"_hwid", "HW-2"}, {"_deviceIDHash", "9f2c"}, {"_phoneName", "<b>Kestrel</b> & co"},
-            {"_targetID", "0x00C0FFEE"}, {"_zantVersion", "4.2.1"}, {"_zantBuild", "4210"}, {"_staticBuild", "S-77"},
-            {"_dynamicBuild", "D-78"}, {"_csBuild", "CS 9.1"}, {"_totalMemory", "10.00 kB"}, {"_freeMemory", "9998 bytes"},
+            {"_manufacturer", "Norvale"}, {"_imei", "490154203237518"}, {"_phoneName", "<b>Kestrel</b> & co"},
+            {"_zantVersion", "4.2.1"}, {"_totalMemory", "10.00 kB"}, {"_freeMemory", "9998 bytes"},
             {"_fsSpace", "0 bytes"}, {"_fsFree", "0 bytes"},
         };
         for (const auto& [name, text] : labels) {
