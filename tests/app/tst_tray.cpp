@@ -259,7 +259,6 @@ private slots:
     void exitDuringAConnect_data()
     {
         QTest::addColumn<bool>("programEnds");
-        QTest::newRow("event loop goes on") << false;
         QTest::newRow("program ends") << true;
     }
     void exitDuringAConnect()

@@ -1,4 +1,3 @@
-#include "AboutDialog.h"
 #include "EnsureWindowPlacementOnDesktop.h"
 #include "FreeFormProgressDialog.h"
 #include "SaveXmlReport.h"
@@ -7,8 +6,6 @@
 
 #include <QAbstractEventDispatcher>
 #include <QApplication>
-#include <QDirIterator>
-#include <QImage>
 #include <QPointer>
 #include <QSettings>
 #include <QTemporaryDir>
@@ -104,22 +101,6 @@ private slots:
         QCOMPARE(window.pos(), expected);
     }
 
-    // A picture that does not load shows as a blank icon.
-    void everyResourceLoads()
-    {
-        QStringList loaded;
-        for (const char* folder : {":/Resources", ":/LockStatusWidget"}) {
-            for (QDirIterator it(folder, QDir::Files, QDirIterator::Subdirectories); it.hasNext();) {
-                loaded << it.next();
-                QVERIFY2(!QImage(loaded.last()).isNull(), qPrintable(loaded.last()));
-            }
-        }
-        for (const char* named : {":/Resources/splash.png", ":/Resources/about.png", ":/Resources/InfoCursor.png"})
-            QVERIFY2(loaded.contains(named), named);
-        QVERIFY(!QImage("://Resources/Delvix.png").isNull());  // as the forms name it
-        QCOMPARE(QImage(":/Resources/TrayIcon.png").size(), QSize(16, 16));
-    }
-
     void splashClosesOnlyOnItsOwnCappedTimer()
     {
         QPointer<SplashDialog> splash = new SplashDialog(":/Resources/splash.png", "notice", "0.5.1.0");
@@ -139,16 +120,6 @@ private slots:
         QVERIFY(QAbstractEventDispatcher::instance()->registeredTimers(splash).isEmpty());
         QCoreApplication::sendPostedEvents(nullptr, QEvent::DeferredDelete);
         QVERIFY(!splash);
-    }
-
-    void aboutClosesOnMouseRelease()
-    {
-        AboutDialog about(":/Resources/about.png", "notice", "0.5.1.0");
-        about.show();
-        QVERIFY(QTest::qWaitForWindowExposed(&about));
-        QTest::mouseRelease(&about, Qt::RightButton, Qt::NoModifier, QPoint(420, 40));
-        QVERIFY(!about.isVisible());
-        QCOMPARE(about.result(), int(QDialog::Accepted));
     }
 
     void asksAndWritesTheReportUnchanged()

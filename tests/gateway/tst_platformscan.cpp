@@ -1,4 +1,3 @@
-#include "MifBatchReader.h"
 #include "MifEntry.h"
 #include "MifWriter.h"
 #include "Portlex.h"
@@ -198,26 +197,6 @@ private slots:
             QCOMPARE(recorder.threadsAtStop, threadsBefore);
             QCOMPARE(opens.take(), 0);
         }
-    }
-
-    void readerStartsNoFileAfterCancel()
-    {
-        constexpr int Threads = 3;
-        QTemporaryDir dir;
-        const QStringList paths = writeFlatFolder(dir.path());
-        QCOMPARE(paths.size(), 500);
-        OpenCounter opens(dir.path());
-        QVERIFY(opens.watching);
-        {
-            MifBatchReader reader(paths, Threads);
-            MifEntry entry;
-            QVERIFY(reader.take(0, entry));
-            QCOMPARE(entry.classes, QVector<quint32>({ 1 }));
-            reader.cancel();
-            opens.take();
-        }
-        // Each worker may finish the file it had claimed, but claims no other.
-        QVERIFY2(opens.take() <= Threads - 1, "workers kept reading after the cancel");
     }
 
     void nothingToScan()

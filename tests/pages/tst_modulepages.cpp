@@ -216,28 +216,6 @@ private slots:
         QCOMPARE(page.xmlReport(), QString("<!DOCTYPE registrylist>\n<entries/>\n"));
     }
 
-    // Both clicks bring the cell's text; a null cell brings nothing.
-    void clicksEmitTheCellText()
-    {
-        RegistryListView page;
-        page.resize(800, 400);
-        page.show();
-        page.startComponent("registry");
-        QVERIFY(fillByHand(page));
-        QVERIFY(QTest::qWaitForWindowExposed(&page));
-        QTableWidget* table = page._registryTable;
-        const QPoint cell = table->visualItemRect(table->item(0, MimeTypeColumn)).center();
-        QSignalSpy singles(&page, &RegistryListView::singleClick);
-        QSignalSpy doubles(&page, &RegistryListView::doubleClick);
-        QTest::mouseClick(table->viewport(), Qt::LeftButton, {}, cell);
-        QTest::mouseDClick(table->viewport(), Qt::LeftButton, {}, cell);
-        QCOMPARE(signalTexts(singles), QStringList(table->item(0, MimeTypeColumn)->text()));
-        QCOMPARE(signalTexts(doubles), QStringList(table->item(0, MimeTypeColumn)->text()));
-        page.onTableClick(nullptr);
-        page.onTableDoubleClick(nullptr);
-        QCOMPARE(singles.count() + doubles.count(), 2);
-    }
-
 private:
     QTemporaryDir m_sockets;
     QTemporaryDir m_image;

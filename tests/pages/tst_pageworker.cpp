@@ -168,16 +168,6 @@ private slots:
     }
 
     // One timer: a re-arm replaces the pending tick, and the tick comes once.
-    void tickComesOnce()
-    {
-        TickPacer pacer(0, 500);
-        QSignalSpy timeouts(&pacer, &TickPacer::timeout);
-        pacer.armFirst(50);
-        pacer.armBusy(0);
-        QTRY_COMPARE(timeouts.count(), 1);
-        QVERIFY(!pacer.isArmed());
-    }
-
     void feedStepsAndDrains()
     {
         PageFeed<int> feed;
@@ -200,21 +190,6 @@ private slots:
         feed.clear();
         feed.close();
         QCOMPARE(feed.drain(show), FeedStep::Drained);
-    }
-
-    void drainStopsAtItsBudget()
-    {
-        PageFeed<int> feed;
-        feed.append(QVector<int>(100, 7));
-        int shown = 0;
-        const auto slowShow = [&shown](int) { ++shown, QThread::msleep(2); };
-        // A budget spent by the first record still shows that one, and no more.
-        QCOMPARE(feed.drain(slowShow, 1), FeedStep::Shown);
-        QCOMPARE(shown, 1);
-        // Records take at least 2 ms each: a 5 ms budget is spent by the third.
-        QCOMPARE(feed.drain(slowShow, 5), FeedStep::Shown);
-        QVERIFY(shown >= 2 && shown <= 4);
-        QCOMPARE(feed.count(), 100 - shown);
     }
 
     // Until the device answers, ticks keep coming and show nothing; then one row per tick,

@@ -15,14 +15,6 @@ using namespace PageFixtures;
 
 namespace {
 
-// classes, then enough unavailable ones to keep the worker, and so the fill, going.
-DeviceCache busyDevice(QList<IdRecord> classes)
-{
-    for (int i = 0x100; i < 0x1500; ++i)
-        classes.append(makeClass(QString("0x%1").arg(i, 8, 16, QChar('0')), "Off", "F", "S", false));
-    return cacheOf(classes);
-}
-
 // Classes of a small device: two families, one class unavailable.
 DeviceCache smallDevice()
 {
@@ -89,25 +81,6 @@ private slots:
                               "unknown|||", " |unknown||", "  ||unknown|0x00000005", "zeta|||", " |Time||", "  ||Clock|0x00000007"}));
         QCOMPARE(signalTexts(states), QStringList({"Processing", "Complete"}));
         QVERIFY(page._familyTree->isSortingEnabled());
-    }
-
-    // The fill puts each new family in its place: the tree is in order at every moment.
-    void familiesStayInOrderWhileFilling()
-    {
-        DeviceCache cache = busyDevice({makeClass("0x00000001", "Z", "zeta", "S"), makeClass("0x00000002", "A", "Alpha", "S"),
-                                        makeClass("0x00000003", "M", "media", "S"), makeClass("0x00000004", "B", "Beta", "S"),
-                                        makeClass("0x00000005", "M2", "Media", "T")});
-        FamilyTreeView page;
-        page.setDeviceRecord(&cache);
-        QStringList families;
-        QVERIFY(tickUntil(page, [&] {
-            families.clear();
-            for (int i = 0; i < page._familyTree->topLevelItemCount(); ++i)
-                families.append(page._familyTree->topLevelItem(i)->text(0));
-            return families.size() == 4 && page._familyTree->topLevelItem(2)->childCount() == 2;
-        }));
-        QCOMPARE(families, QStringList({"Alpha", "Beta", "media", "zeta"}));
-        QCOMPARE(page.state(), GatewayComponentWidget::Processing);
     }
 
     // The export follows the tree as the user sorted it, frozen at the first call; without

@@ -184,7 +184,7 @@ private slots:
 
         m_image.fillDefault();
         m_image.writeFile("flash/usermod/odd/odd.mif", odd);
-        for (const char* name : {"copy.mif", "UPPER.MIF", "archive.old.mif"})
+        for (const char* name : {"UPPER.MIF", "archive.old.mif"})
             m_image.writeFile(QStringLiteral("flash/shared/") + name, odd);
         qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_sockets.path()));
         Portlex::Initialize();
@@ -224,7 +224,6 @@ private slots:
         QTest::addColumn<QString>("device");  // none: a file on disk
         QTest::addColumn<QString>("path");
         QTest::addColumn<bool>("read");
-        QTest::newRow("missing file") << "" << m_files.filePath("missing.mif") << false;
         QTest::newRow("not a MIF") << "" << m_files.filePath("garbage.mif") << false;
         QTest::newRow("MIF without a module") << "" << m_files.filePath("empty.mif") << true;
         QTest::newRow("unknown device") << "nobody" << OddModulePath << false;
@@ -327,7 +326,6 @@ private slots:
     {
         QTest::addColumn<QString>("name");
         QTest::addColumn<QString>("opens");  // a dialog's title, "desktop", or empty for nothing
-        QTest::newRow("mif") << "copy.mif" << "Module Info copy";
         QTest::newRow("MIF") << "UPPER.MIF" << "Module Info UPPER";
         QTest::newRow("two suffixes") << "archive.old.mif" << "desktop";
         QTest::newRow("missing file") << "none.txt" << "";
