@@ -40,10 +40,8 @@ private slots:
         QTest::addColumn<int>("width");
         QTest::addColumn<QByteArray>("bytes");
         QTest::addColumn<quint32>("value");
-        QTest::newRow("16 little") << int(QStream::LittleEndian) << 2 << QByteArray("\x34\x12") << 0x1234u;
         QTest::newRow("16 big") << int(QStream::BigEndian) << 2 << QByteArray("\x12\x34") << 0x1234u;
         QTest::newRow("32 little") << int(QStream::LittleEndian) << 4 << QByteArray("\x78\x56\x34\x12") << 0x12345678u;
-        QTest::newRow("32 big") << int(QStream::BigEndian) << 4 << QByteArray("\x12\x34\x56\x78") << 0x12345678u;
     }
     void byteOrder()
     {
