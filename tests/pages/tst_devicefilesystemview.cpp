@@ -17,6 +17,7 @@
 #include <QProgressDialog>
 #include <QPushButton>
 #include <QRegularExpression>
+#include <QSemaphore>
 #include <QSignalSpy>
 #include <QTemporaryDir>
 #include <QTimer>
@@ -57,6 +58,14 @@ const QList<QPair<QString, int>> CrawlOrder = {{"/", 7},       {"/usermod", 1}, 
                                                {"/user", 1},   {"/user/photos", 1}, {"/err", 1},
                                                {"/shared", 1}, {"/alpha", 2},   {"/zeta", 1}};
 
+int itemCount(QTreeWidget* tree)
+{
+    int count = 0;
+    for (QTreeWidgetItemIterator it(tree); *it; ++it)
+        ++count;
+    return count;
+}
+
 QTreeWidgetItem* itemAt(QTreeWidget* tree, const QString& path)
 {
     for (QTreeWidgetItemIterator it(tree); *it; ++it) {
@@ -67,26 +76,32 @@ QTreeWidgetItem* itemAt(QTreeWidget* tree, const QString& path)
 }
 
 // Answers the next message box with a button and remembers its title and text.
-struct BoxAnswer {
+class BoxAnswer
+{
+public:
     explicit BoxAnswer(QMessageBox::StandardButton button)
     {
-        QObject::connect(&timer, &QTimer::timeout, [this, button] {
+        QObject::connect(&m_timer, &QTimer::timeout, [this, button] {
             if (auto* box = qobject_cast<QMessageBox*>(QApplication::activeModalWidget())) {
                 seen = box->windowTitle() + "|" + box->text();
                 box->button(button)->click();
-                timer.stop();
+                m_timer.stop();
             }
         });
-        timer.start(10);
+        m_timer.start(10);
     }
     QString seen;
-    QTimer timer;
+
+private:
+    QTimer m_timer;
 };
 
-// Sends a drag of mime over the item at path and drops it there; true when the tree accepted the drag.
+// Sends a drag of mime over the item at path (the empty space below the rows when empty) and
+// drops it there; true when the tree accepted the drag.
 bool dragAndDrop(QTreeWidget* tree, const QString& path, QMimeData* mime)
 {
-    const QPoint at = tree->visualItemRect(itemAt(tree, path)).center();
+    QTreeWidgetItem* item = itemAt(tree, path);
+    const QPoint at = item ? tree->visualItemRect(item).center() : QPoint(10, tree->viewport()->height() - 5);
     QDragEnterEvent enter(at, Qt::CopyAction, mime, Qt::LeftButton, Qt::NoModifier);
     QCoreApplication::sendEvent(tree->viewport(), &enter);
     if (!enter.isAccepted())
@@ -179,7 +194,7 @@ private slots:
         int before = 0;
         QStringList wrong;
         connect(&page.pacer(), &TickPacer::armed, this, [&](int ms) {
-            const int now = int(treeLines(page._fsTree).size());
+            const int now = itemCount(page._fsTree);
             if (ms == 0 && shown < fetched.size()) {
                 const QString path = fetched.at(shown++);
                 const auto level = std::find_if(CrawlOrder.cbegin(), CrawlOrder.cend(), [&](const auto& l) { return l.first == path; });
@@ -241,39 +256,49 @@ private slots:
         QVERIFY(!itemAt(tree, "/alpha/ten.bin"));
     }
 
-    // Local files dropped on the tree (the top-level entries of local): where they land, what
-    // is refused, the messages.
+    // Local files dropped on the tree: where they land, what is refused, the messages.
     void drop_data()
     {
-        QTest::addColumn<QStringList>("local");   // files (trailing "/": an empty folder) to make; none: plain text
-        QTest::addColumn<QString>("onto");        // item path
+        QTest::addColumn<QStringList>("local");   // files (trailing "/": an empty folder) to make
+        QTest::addColumn<QStringList>("dropped"); // what is dragged; empty: plain text
+        QTest::addColumn<QString>("onto");        // item path; empty: below the rows
         QTest::addColumn<QString>("simulator");   // a --fail rule
         QTest::addColumn<QString>("box");         // the message box shown
         QTest::addColumn<QStringList>("arrived"); // device file=local file with the same bytes
         QTest::addColumn<QStringList>("messages");
-        const auto row = [](const char* tag, const QStringList& local, const QString& onto, const QString& simulator,
-                            const QString& box, const QStringList& arrived, const QStringList& messages) {
-            QTest::newRow(tag) << local << onto << simulator << box << arrived << messages;
-        };
-        row("folder keeps its name and layout", {"drop/b.txt", "drop/sub/a.txt", "drop/.hidden"}, "/alpha/nine.bin", "", "",
-            {"/alpha/drop/b.txt=drop/b.txt", "/alpha/drop/sub/a.txt=drop/sub/a.txt"},
-            {"File %/drop/b.txt Copied", "File %/drop/sub/a.txt Copied"});
-        row("top-level file means the root", {"x.txt"}, "/readme.txt", "", "", {"/x.txt=x.txt"}, {"File %/x.txt Copied"});
-        row("package in capitals installed", {"Tool.ZANTRO"}, "/alpha", "", "", {}, {"%/Tool.ZANTRO installed."});
-        row("failed copy gives the real code", {"x.txt"}, "/zeta", "CopyToDeviceBegin=1104", "", {},
-            {"Error copying file %/x.txt Error: 1104"});
-        row("empty folder", {"empty/"}, "/alpha", "", "Files not Copied|The dropped selection did not contain any copyable files.",
-            {}, {});
-        row("free space reached", {"full.bin"}, "/alpha", "",
-            "Not enough space on the device|The target does not have enough freespace to complete the copy", {}, {});
-        row("one byte below free space", {"almost.bin"}, "/alpha", "", "", {"/alpha/almost.bin=almost.bin"},
-            {"File %/almost.bin Copied"});
-        row("plain text refused", {}, "/alpha", "", "", {}, {});
+
+        QTest::newRow("folder keeps its name and layout")
+            << QStringList{"drop/b.txt", "drop/sub/a.txt", "drop/.hidden"} << QStringList{"drop"} << "/alpha/nine.bin"
+            << QString() << QString() << QStringList{"/alpha/drop/b.txt=drop/b.txt", "/alpha/drop/sub/a.txt=drop/sub/a.txt"}
+            << QStringList{"File %/drop/b.txt Copied", "File %/drop/sub/a.txt Copied"};
+        QTest::newRow("top-level file means the root")
+            << QStringList{"x.txt"} << QStringList{"x.txt"} << "/readme.txt" << QString() << QString()
+            << QStringList{"/x.txt=x.txt"} << QStringList{"File %/x.txt Copied"};
+        QTest::newRow("package in capitals installed")
+            << QStringList{"Tool.ZANTRO"} << QStringList{"Tool.ZANTRO"} << "/alpha" << QString() << QString()
+            << QStringList() << QStringList{"%/Tool.ZANTRO installed."};
+        QTest::newRow("failed copy gives the real code")
+            << QStringList{"x.txt"} << QStringList{"x.txt"} << "/zeta" << "CopyToDeviceBegin=1104" << QString()
+            << QStringList() << QStringList{"Error copying file %/x.txt Error: 1104"};
+        QTest::newRow("empty folder") << QStringList{"empty/"} << QStringList{"empty"} << "/alpha" << QString()
+                                      << "Files not Copied|The dropped selection did not contain any copyable files."
+                                      << QStringList() << QStringList();
+        QTest::newRow("free space reached") << QStringList{"full.bin"} << QStringList{"full.bin"} << "/alpha" << QString()
+                                            << "Not enough space on the device|The target does not have enough freespace to complete the copy"
+                                            << QStringList() << QStringList();
+        QTest::newRow("one byte below free space") << QStringList{"almost.bin"} << QStringList{"almost.bin"} << "/alpha"
+                                                   << QString() << QString() << QStringList{"/alpha/almost.bin=almost.bin"}
+                                                   << QStringList{"File %/almost.bin Copied"};
+        QTest::newRow("below the rows") << QStringList{"x.txt"} << QStringList{"x.txt"} << QString() << QString()
+                                        << QString() << QStringList() << QStringList();
+        QTest::newRow("plain text refused") << QStringList() << QStringList() << "/alpha" << QString() << QString()
+                                            << QStringList() << QStringList();
     }
 
     void drop()
     {
         QFETCH(QStringList, local);
+        QFETCH(QStringList, dropped);
         QFETCH(QString, onto);
         QFETCH(QString, simulator);
         QFETCH(QString, box);
@@ -302,20 +327,18 @@ private slots:
         QVERIFY(page);
         QSignalSpy statuses(page.get(), &GatewayComponentWidget::timedStatusChanged);
         QSignalSpy finished(page.get(), &DeviceFileSystemView::transferFinished);
-        QMimeData mime;
+        auto* mime = new QMimeData;
         QList<QUrl> urls;
-        for (const QString& file : local) {
-            const QUrl url = QUrl::fromLocalFile(folder.filePath(file.section('/', 0, 0)));
-            if (!urls.contains(url))
-                urls << url;
-        }
+        for (const QString& entry : dropped)
+            urls << QUrl::fromLocalFile(folder.filePath(entry));
         if (urls.isEmpty())
-            mime.setText("plain");
+            mime->setText("plain");
         else
-            mime.setUrls(urls);
+            mime->setUrls(urls);
+        std::unique_ptr<QMimeData> owned(mime);
 
         BoxAnswer answer(QMessageBox::Ok);
-        QCOMPARE(dragAndDrop(page->_fsTree, onto, &mime), !local.isEmpty());
+        QCOMPARE(dragAndDrop(page->_fsTree, onto, mime), !dropped.isEmpty());
         if (!messages.isEmpty())
             QVERIFY(finished.wait(20000));
         QCOMPARE(answer.seen, box);
@@ -391,7 +414,8 @@ private slots:
     }
 
     // The watcher reports adds, removals and renames below its root with "/" paths, skips
-    // hidden folders and ends on stop() while nothing happens.
+    // hidden folders, goes on watching after the kernel's queue overflowed and ends on stop()
+    // while nothing happens.
     void watcher()
     {
         QTemporaryDir root;
@@ -423,6 +447,27 @@ private slots:
                                       "file- " + r + "/new"};
         QTRY_COMPARE(events.filter(QRegularExpression("^(file\\+|dir\\+|old|new|file-) ")), expected);
 
+        // Overflow: the watcher is held in a report while far more changes happen than the
+        // kernel queues, a new folder among them; it then watches that folder too.
+        std::atomic<bool> hold{true};
+        QSemaphore entered;
+        connect(&monitor, &WinVolumeMonitor::fileAddedEvent, this, [&](const QString& path) {
+            if (path.endsWith("/gate")) {
+                entered.release();
+                while (hold)
+                    QThread::msleep(1);
+            }
+        }, Qt::DirectConnection);
+        QVERIFY(writeFile(root.filePath("gate"), "g"));
+        QVERIFY(entered.tryAcquire(1, 10000));
+        for (int n = 0; n < 20000; ++n)
+            QVERIFY(QFile(root.filePath("f" + QString::number(n))).open(QIODevice::WriteOnly));
+        QVERIFY(QDir().mkdir(root.filePath("during")));
+        hold = false;
+        QTRY_COMPARE_WITH_TIMEOUT(monitor.watchedFolders(), 4, 20000);
+        QVERIFY(writeFile(root.filePath("during/seen.txt"), "s"));
+        QTRY_VERIFY_WITH_TIMEOUT(events.contains("file+ " + r + "/during/seen.txt"), 20000);
+
         monitor.stop();
         QVERIFY(monitor.wait(10000));
     }
@@ -437,6 +482,7 @@ private slots:
         QTest::newRow("folder open to all") << "open" << false;
         QTest::newRow("link to another folder") << "link" << false;
         QTest::newRow("another user's folder") << "foreign" << false;
+        QTest::newRow("a file") << "file" << false;
     }
 
     void privateTempFolder()
@@ -456,6 +502,8 @@ private slots:
             QSKIP("files cannot be given to another user here");
         if (planted == "link")
             QVERIFY(QFile::link(elsewhere, usual));
+        if (planted == "file")
+            QVERIFY(writeFile(usual, "x"));
 
         const QString folder = ::privateTempFolder(base.path());
         QCOMPARE(folder == usual, reused);

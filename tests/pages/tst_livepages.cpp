@@ -18,10 +18,15 @@ namespace {
 
 using Page = LiveTreePage;
 
-// Kernel stays; /usermod/app/app.mod can be run.
+// Kernel stays; /usermod/app/app.mod can be run. On "evolving", Shell's threads come and go,
+// and its viewer is loaded and unloaded, every 150 ms.
 const QByteArray Still = "<processes evolve='no' interval='100'><process name='Kernel'>"
                          "<thread name='idle' priority='0' state='1'/><thread name='odd' priority='5' state='7'/>"
                          "<module name='k.bin' location='/sys/k.bin' size='0'/></process></processes>";
+const QByteArray Evolving = "<processes evolve='yes' seed='5' interval='150' max='1'><process name='Shell'>"
+                            "<thread name='ui' priority='160' state='1'/><module name='shell.mod' location='/sys/shell.mod'"
+                            " size='14336'/><module name='viewer.mod' location='/sys/viewer.mod' size='8192' onDemand='yes'/>"
+                            "</process></processes>";
 
 bool writeImage(const QString& folder, const QByteArray& processes)
 {
@@ -37,7 +42,10 @@ std::unique_ptr<Page> makePage(bool threads)
     return threads ? std::unique_ptr<Page>(new ProcessView) : std::unique_ptr<Page>(new LoadedModuleView);
 }
 
-QTreeWidget* treeOf(Page& page) { return page.findChild<QTreeWidget*>(); }
+QTreeWidget* treeOf(Page& page)
+{
+    return page.findChild<QTreeWidget*>();
+}
 
 // A row's life as one text: its state, its age while it counts, and its colour.
 QString life(const QTreeWidgetItem* row)
@@ -62,7 +70,11 @@ QList<QTreeWidgetItem*> appRows(QTreeWidget* tree)
     return tree->findItems("app", Qt::MatchExactly, ProcessView::ProcessNameColumn);
 }
 
-void tick(Page& page, int times) { for (int i = 0; i < times; ++i) page.onTimeElapse(); }
+void tick(Page& page, int times)
+{
+    for (int i = 0; i < times; ++i)
+        page.onTimeElapse();
+}
 
 // Ticks a gone row by hand: it is still there at its fifth tick and gone at the sixth.
 bool ticksToRemoval(Page& page, QTreeWidgetItem* row)
@@ -93,7 +105,8 @@ QVector<ProcessInfo> changed(int change)
 } // namespace
 
 // The threads and loaded modules pages, live on real simulators: a still device where the
-// test starts applications, an empty one and a failing one.
+// test starts applications, one whose threads and modules change by themselves, an empty one
+// and a failing one.
 class TestLivePages : public QObject
 {
     Q_OBJECT
@@ -103,9 +116,11 @@ private slots:
     {
         qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_sockets.path()));
         QVERIFY(Portlex::Initialize());
-        QVERIFY(writeImage(m_stillImage.path(), Still) && writeImage(m_emptyImage.path(), "<processes evolve='no'/>"));
+        QVERIFY(writeImage(m_stillImage.path(), Still) && writeImage(m_evolvingImage.path(), Evolving)
+                && writeImage(m_emptyImage.path(), "<processes evolve='no'/>"));
         m_device = m_still.connectDevice(m_stillImage.path(), "still", {"--run-lifetime", "2500"});
         QVERIFY(m_device);
+        QVERIFY(m_evolving.connectDevice(m_evolvingImage.path(), "evolving"));
         QVERIFY(m_empty.connectDevice(m_emptyImage.path(), "empty"));
         QVERIFY(m_failing.connectDevice(m_stillImage.path(), "failing", {"--fail", "GetProcesses=5"}));
     }
@@ -184,6 +199,42 @@ private slots:
         QCOMPARE(appRows(page._processTree), QList<QTreeWidgetItem*>({second}));
     }
 
+    // Threads and modules of a running process come and go: a new one is green, a vanished one
+    // turns red and goes at its sixth tick.
+    void entriesComeAndGo_data()
+    {
+        QTest::addColumn<bool>("threads");
+        QTest::newRow("threads") << true;
+        QTest::newRow("loaded modules") << false;
+    }
+
+    void entriesComeAndGo()
+    {
+        QFETCH(bool, threads);
+        const std::unique_ptr<Page> page = makePage(threads);
+        page->startComponent("evolving");
+        QTreeWidget* tree = treeOf(*page);
+        QVERIFY(tickUntil(*page, [&] { return tree->topLevelItemCount() == 1; }));
+        QTreeWidgetItem* shell = tree->topLevelItem(0);
+        const quint32 highest = shell->child(shell->childCount() - 1)->data(0, Page::IdRole).toUInt();
+        const auto find = [shell](auto match) {
+            QTreeWidgetItem* found = nullptr;
+            for (int i = shell->childCount() - 1; i >= 0; --i)
+                found = match(shell->child(i)) ? shell->child(i) : found;
+            return found;
+        };
+        const auto isNew = [highest](QTreeWidgetItem* row) { return row->data(0, Page::IdRole).toUInt() > highest; };
+        const auto isGone = [](QTreeWidgetItem* row) { return life(row).startsWith("gone"); };
+        QTRY_VERIFY_WITH_TIMEOUT(find(isNew), 15000);
+        const QTreeWidgetItem* added = find(isNew);
+        QVERIFY2(life(added).startsWith("new") && life(added).endsWith("green"), qPrintable(life(added)));
+        QCOMPARE(QStringList({added->text(1), added->text(2), added->text(3)}),
+                 threads ? QStringList({"ui worker", added->text(2), "Default"}) : QStringList({"viewer.mod", "8192", "/sys/viewer.mod"}));
+        QTRY_VERIFY_WITH_TIMEOUT(find(isGone), 15000);
+        QVERIFY2(life(find(isGone)).endsWith("red"), qPrintable(life(find(isGone))));
+        QVERIFY(ticksToRemoval(*page, find(isGone)));
+    }
+
     // The statuses a page ends at: an empty device is ready without ever updating and goes on
     // polling; a failed poll ends the worker and its error stays; an unknown device starts nothing.
     void statusesAndFailures_data()
@@ -219,8 +270,10 @@ private slots:
 private:
     QTemporaryDir m_sockets;
     QTemporaryDir m_stillImage;
+    QTemporaryDir m_evolvingImage;
     QTemporaryDir m_emptyImage;
     SimulatorProcess m_still{m_sockets.path()};
+    SimulatorProcess m_evolving{m_sockets.path()};
     SimulatorProcess m_empty{m_sockets.path()};
     SimulatorProcess m_failing{m_sockets.path()};
     QSharedPointer<_ZantDevice> m_device;
