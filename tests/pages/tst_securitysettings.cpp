@@ -63,6 +63,7 @@ private slots:
         const QList<std::tuple<const char*, QDate, QString>> services
             = {{"service 7 days", today.addDays(7), "GreenLED"},
                 {"service 6 days", today.addDays(6), "YellowLED"},
+                {"service expired", today.addDays(-1), "YellowLED"},
                 {"service padded day", QDate(later.year(), later.month(), 5), "GreenLED"}};
         for (const auto& [tag, date, led] : services) {
             const QString expiry = ctimeText(date);
