@@ -4,12 +4,29 @@
 
 #include <QCoreApplication>
 #include <QElapsedTimer>
+#include <QFile>
 #include <QProcess>
+#include <QTemporaryDir>
 #include <QThread>
 
 #include <sys/resource.h>
 
 namespace PageBenchDevice {
+
+void useOffscreenAndWorkSettings(const QTemporaryDir& work)
+{
+    if (qEnvironmentVariableIsEmpty("QT_QPA_PLATFORM"))
+        qputenv("QT_QPA_PLATFORM", "offscreen");
+    qputenv("XDG_CONFIG_HOME", QFile::encodeName(work.filePath(QStringLiteral("config"))));
+}
+
+void startSimulator(QProcess& server, const QString& image, const QString& sockets, const QString& id)
+{
+    qputenv("ZANTRO_SIM_DIR", QFile::encodeName(sockets));
+    server.start(simulatorPath(), {QStringLiteral("--image"), image, QStringLiteral("--id"), id,
+                                   QStringLiteral("--socket-dir"), sockets});
+    Portlex::Initialize();
+}
 
 QString simulatorPath()
 {

@@ -3,6 +3,8 @@
 #include <QSharedPointer>
 #include <QString>
 
+class QProcess;
+class QTemporaryDir;
 class _ZantDevice;
 
 // What both page benchmarks need around the pages: a generated image, the device that a
@@ -11,7 +13,12 @@ namespace PageBenchDevice {
 
 const QString DeviceId = QStringLiteral("bench");
 
+// Before the application is made: the offscreen platform unless one is set, and the
+// windows' settings in the work folder rather than the user's.
+void useOffscreenAndWorkSettings(const QTemporaryDir& work);
 QString simulatorPath();
+// Serves image as device id on a socket in sockets, the folder the gateway then looks in.
+void startSimulator(QProcess& server, const QString& image, const QString& sockets, const QString& id = DeviceId);
 bool generateImage(const QString& image, int modules, int classes);
 // Waits (up to two minutes, while a large image loads) for the simulator and connects it.
 QSharedPointer<_ZantDevice> connectDevice(const QString& id = DeviceId);

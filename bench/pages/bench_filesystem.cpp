@@ -202,10 +202,8 @@ void watcher(const QString& work, int folders)
 
 int main(int argc, char** argv)
 {
-    if (qEnvironmentVariableIsEmpty("QT_QPA_PLATFORM"))
-        qputenv("QT_QPA_PLATFORM", "offscreen");
     QTemporaryDir work;
-    qputenv("XDG_CONFIG_HOME", QFile::encodeName(work.filePath(QStringLiteral("config"))));
+    useOffscreenAndWorkSettings(work);
     // The page watches the home folder; here it is the work folder.
     qputenv("HOME", QFile::encodeName(work.filePath(QStringLiteral("home"))));
     QDir().mkpath(work.filePath(QStringLiteral("home")));
@@ -228,11 +226,8 @@ int main(int argc, char** argv)
         std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulatorPath()));
         return 1;
     }
-    qputenv("ZANTRO_SIM_DIR", QFile::encodeName(sockets));
     QProcess server;
-    server.start(simulatorPath(), {QStringLiteral("--image"), image, QStringLiteral("--id"), DeviceId,
-                                   QStringLiteral("--socket-dir"), sockets});
-    Portlex::Initialize();
+    startSimulator(server, image, sockets);
     if (!connectDevice()) {
         std::fprintf(stderr, "the simulator did not answer: %s\n", qPrintable(QString::fromLocal8Bit(server.readAll())));
         return 1;

@@ -131,11 +131,8 @@ void report(const QString& name, GatewayComponentWidget* page, QTableWidget* tab
 
 int main(int argc, char** argv)
 {
-    if (qEnvironmentVariableIsEmpty("QT_QPA_PLATFORM"))
-        qputenv("QT_QPA_PLATFORM", "offscreen");
-    // The windows keep settings; these go to the work folder, not to the user's.
     QTemporaryDir work;
-    qputenv("XDG_CONFIG_HOME", QFile::encodeName(work.filePath(QStringLiteral("config"))));
+    useOffscreenAndWorkSettings(work);
     QApplication app(argc, argv);
     QCommandLineParser options;
     options.addHelpOption();
@@ -151,11 +148,8 @@ int main(int argc, char** argv)
         std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulatorPath()));
         return 1;
     }
-    qputenv("ZANTRO_SIM_DIR", QFile::encodeName(sockets));
     QProcess server;
-    server.start(simulatorPath(), {QStringLiteral("--image"), image, QStringLiteral("--id"), DeviceId,
-                               QStringLiteral("--socket-dir"), sockets});
-    Portlex::Initialize();
+    startSimulator(server, image, sockets);
     const QSharedPointer<_ZantDevice> device = connectDevice();
     if (!device) {
         std::fprintf(stderr, "the simulator did not answer: %s\n", qPrintable(QString::fromLocal8Bit(server.readAll())));

@@ -192,11 +192,8 @@ int main(int argc, char** argv)
         std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulatorPath()));
         return 1;
     }
-    qputenv("ZANTRO_SIM_DIR", QFile::encodeName(sockets));
     QProcess server;
-    server.start(simulatorPath(), {QStringLiteral("--image"), image, QStringLiteral("--id"), DeviceId,
-                               QStringLiteral("--socket-dir"), sockets});
-    Portlex::Initialize();
+    startSimulator(server, image, sockets);
     const QSharedPointer<_ZantDevice> device = connectDevice();
     if (!device) {
         std::fprintf(stderr, "the simulator did not answer: %s\n", qPrintable(QString::fromLocal8Bit(server.readAll())));

@@ -162,11 +162,8 @@ void summary(const QString& route, QList<Opening> rounds)
 
 int main(int argc, char** argv)
 {
-    if (qEnvironmentVariableIsEmpty("QT_QPA_PLATFORM"))
-        qputenv("QT_QPA_PLATFORM", "offscreen");
-    // The dialogs keep their geometry in the settings; these go to the work folder.
     QTemporaryDir work;
-    qputenv("XDG_CONFIG_HOME", QFile::encodeName(work.filePath(QStringLiteral("config"))));
+    useOffscreenAndWorkSettings(work);
     QApplication app(argc, argv);
     QCommandLineParser options;
     options.addHelpOption();
@@ -200,11 +197,8 @@ int main(int argc, char** argv)
         fileRounds.append(openOnce(fromFile));
     summary(QStringLiteral("file,"), fileRounds);
 
-    qputenv("ZANTRO_SIM_DIR", QFile::encodeName(sockets));
     QProcess server;
-    server.start(simulatorPath(), {QStringLiteral("--image"), image, QStringLiteral("--id"), DeviceId,
-                                   QStringLiteral("--socket-dir"), sockets});
-    Portlex::Initialize();
+    startSimulator(server, image, sockets);
     if (!connectDevice()) {
         std::fprintf(stderr, "the simulator did not answer: %s\n", qPrintable(QString::fromLocal8Bit(server.readAll())));
         return 1;
