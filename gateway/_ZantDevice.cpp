@@ -11,8 +11,6 @@
 #include <QMutexLocker>
 #include <QSaveFile>
 
-#include <fcntl.h>
-
 namespace {
 
 template <typename... Values>
@@ -287,9 +285,6 @@ int _ZantDevice::CopyFileToPC(const QString& devicePath, const QString& localPat
                     return PortlexError::ProtocolError;
                 if (sink.write(data, length) != length)
                     return PortlexError::LocalFileError;
-                // The save file syncs to disk on commit: start the write-back as the bytes
-                // come, so that the commit waits for the last few only.
-                ::sync_file_range(sink.handle(), off64_t(received), length, SYNC_FILE_RANGE_WRITE);
                 received += quint64(length);
                 return progress.cancelled(received) ? qint32(PortlexError::Cancelled) : 0;
             },

@@ -201,7 +201,7 @@ int main(int argc, char* argv[])
     row("raw socket stream, two processes", raw);
     row("plain local copy + fsync", times[2]);
     row("CopyFileToDevice", times[3]);
-    row("CopyFileToPC (save file, synced)", times[4]);
+    row("CopyFileToPC (save file)", times[4]);
     std::printf("  target: both copies >= 0.70x the plain copy\n");
     std::printf("  peak memory: bench (client) %.1f MiB, simulator %.1f MiB\n", peakMiB(QCoreApplication::applicationPid()),
                 peakMiB(simulator.processId()));
