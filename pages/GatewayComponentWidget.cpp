@@ -255,3 +255,19 @@ bool GatewayComponentWidget::applyTreeSearch(const QString& text, QTreeWidget* t
     searchTree(text, tree);
     return true;
 }
+
+QVector<QStringList> GatewayComponentWidget::tableRows(const QTableWidget* table)
+{
+    QVector<QStringList> rows;
+    rows.reserve(table->rowCount());
+    for (int row = 0; row < table->rowCount(); ++row) {
+        QStringList cells;
+        cells.reserve(table->columnCount());
+        for (int column = 0; column < table->columnCount(); ++column) {
+            const QTableWidgetItem* item = table->item(row, column);
+            cells.append(item ? item->text() : QString());
+        }
+        rows.append(cells);
+    }
+    return rows;
+}

@@ -75,6 +75,8 @@ protected:
     bool applyTableSearch(const QString& text, QTableWidget* table);
     // The same for a tree page; true when it searched, false when it cleared.
     bool applyTreeSearch(const QString& text, QTreeWidget* tree);
+    // Every row's cell texts, in the order the table shows them: what an export writes.
+    static QVector<QStringList> tableRows(const QTableWidget* table);
 
 private:
     void reportNotFound();

@@ -3,21 +3,11 @@
 #include "CITableWidgetItem.h"
 #include "ModuleListViewThread.h"
 #include "Portlex.h"
-#include "XmlReport.h"
+#include "ModuleReport.h"
 
 #include <QHeaderView>
 
 namespace {
-
-enum Column
-{
-    NameColumn,
-    VersionColumn,
-    TypeColumn,
-    SignatureColumn,
-    PathColumn,
-    CopyrightColumn
-};
 
 constexpr int RowHeight = 20;
 // Rows the header measures when it fits the columns to their contents: every row of a
@@ -97,23 +87,19 @@ void ModuleListView::appendRow(const ModuleInfo& module)
 {
     const int row = _moduleTable->rowCount();
     _moduleTable->setRowCount(row + 1);
-    _moduleTable->setItem(row, NameColumn, new CITableWidgetItem(module.name));
-    _moduleTable->setItem(row, VersionColumn, new CITableWidgetItem(module.version));
-    auto* type = new CITableWidgetItem(module.GetModuleProperty());
-    type->setData(Qt::UserRole, module.type);
-    _moduleTable->setItem(row, TypeColumn, type);
-    auto* signature = new CITableWidgetItem(module.GetModuleSig());
-    signature->setData(Qt::UserRole, module.signature);
-    _moduleTable->setItem(row, SignatureColumn, signature);
-    _moduleTable->setItem(row, PathColumn, new CITableWidgetItem(module.path));
-    _moduleTable->setItem(row, CopyrightColumn, new CITableWidgetItem(module.copyright));
+    const QStringList cells = ModuleReport::cells(module);
+    for (int column = 0; column < cells.size(); ++column)
+        _moduleTable->setItem(row, column, new CITableWidgetItem(cells.at(column)));
+    // The numbers behind the type and signature texts, for the module information dialog.
+    _moduleTable->item(row, ModuleReport::TypeColumn)->setData(Qt::UserRole, module.type);
+    _moduleTable->item(row, ModuleReport::SignatureColumn)->setData(Qt::UserRole, module.signature);
     _moduleTable->setRowHeight(row, RowHeight);
 }
 
 void ModuleListView::finish()
 {
     // Enabling sorting sorts by the indicator; sortByColumn afterwards would sort again.
-    _moduleTable->horizontalHeader()->setSortIndicator(NameColumn, Qt::AscendingOrder);
+    _moduleTable->horizontalHeader()->setSortIndicator(ModuleReport::NameColumn, Qt::AscendingOrder);
     _moduleTable->setSortingEnabled(true);
     setStatus(readyStatus());
     setState(Complete);
@@ -123,12 +109,12 @@ ModuleInfo ModuleListView::moduleAt(int row) const
 {
     const auto text = [this, row](int column) { return _moduleTable->item(row, column)->text(); };
     ModuleInfo module;
-    module.name = text(NameColumn);
-    module.version = text(VersionColumn);
-    module.type = _moduleTable->item(row, TypeColumn)->data(Qt::UserRole).toUInt();
-    module.signature = _moduleTable->item(row, SignatureColumn)->data(Qt::UserRole).toUInt();
-    module.path = text(PathColumn);
-    module.copyright = text(CopyrightColumn);
+    module.name = text(ModuleReport::NameColumn);
+    module.version = text(ModuleReport::VersionColumn);
+    module.type = _moduleTable->item(row, ModuleReport::TypeColumn)->data(Qt::UserRole).toUInt();
+    module.signature = _moduleTable->item(row, ModuleReport::SignatureColumn)->data(Qt::UserRole).toUInt();
+    module.path = text(ModuleReport::PathColumn);
+    module.copyright = text(ModuleReport::CopyrightColumn);
     return module;
 }
 
@@ -146,22 +132,7 @@ void ModuleListView::onTableDoubleClick(QTableWidgetItem* item)
 
 QString ModuleListView::xmlReport()
 {
-    if (!m_report.isEmpty())
-        return m_report;
-    XmlReport report(QStringLiteral("zant-modules"));
-    QXmlStreamWriter& xml = report.writer();
-    xml.writeStartElement(QStringLiteral("modules"));
-    const auto cell = [this](int row, int column) { return _moduleTable->item(row, column)->text(); };
-    for (int row = 0; row < _moduleTable->rowCount(); ++row) {
-        xml.writeStartElement(QStringLiteral("module"));
-        xml.writeAttribute(QStringLiteral("copyright"), cell(row, CopyrightColumn));
-        xml.writeAttribute(QStringLiteral("path"), cell(row, PathColumn));
-        xml.writeAttribute(QStringLiteral("signature"), cell(row, SignatureColumn));
-        xml.writeAttribute(QStringLiteral("type"), cell(row, TypeColumn));
-        xml.writeAttribute(QStringLiteral("version"), cell(row, VersionColumn));
-        xml.writeAttribute(QStringLiteral("name"), cell(row, NameColumn));
-        xml.writeEndElement();
-    }
-    m_report = report.text();
+    if (m_report.isEmpty())
+        m_report = ModuleReport::build(tableRows(_moduleTable)).toXml();
     return m_report;
 }

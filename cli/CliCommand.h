@@ -1,0 +1,29 @@
+#pragma once
+
+#include <QString>
+#include <QStringList>
+#include <QVector>
+
+class Cli;
+
+// What a pipeline can tell from the exit status.
+enum ExitCode : int
+{
+    ExitSuccess = 0,
+    ExitFinding = 1,        // the level is not met, or the scans differ (when asked to fail on it)
+    ExitUsage = 2,
+    ExitNoDevice = 3,       // no such device, or it refused the connection
+    ExitGatewayError = 4,   // a gateway call or a local file failed
+};
+
+// One command of the tool: its name, how it is called and what it does.
+struct CliCommand
+{
+    QString name;
+    QString synopsis;   // the arguments, e.g. "DEVICE SRC DST"
+    QString summary;    // one line for the command list
+    QString details;    // the rest of the command's help; may be empty
+    int minArguments = 0;
+    int maxArguments = 0;
+    int (*run)(Cli& cli, const QStringList& arguments) = nullptr;
+};

@@ -1,0 +1,6 @@
+#include "DeviceStateCommands.h"
+
+QVector<CliCommand> deviceStateCommands()
+{
+    return {};
+}

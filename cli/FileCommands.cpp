@@ -1,0 +1,6 @@
+#include "FileCommands.h"
+
+QVector<CliCommand> fileCommands()
+{
+    return {};
+}

@@ -1,0 +1,6 @@
+#include "ToolCommands.h"
+
+QVector<CliCommand> toolCommands()
+{
+    return {};
+}
