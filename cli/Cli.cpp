@@ -214,6 +214,8 @@ QSharedPointer<_ZantDevice> Cli::connect(const QString& spec, int* exitCode)
                                            .arg(Portlex::LastStatus()));
         return {};
     }
+    // The greeting is no reason for a later failure.
+    device->statusText.clear();
     *exitCode = ExitSuccess;
     return device;
 }

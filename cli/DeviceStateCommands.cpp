@@ -1,6 +1,70 @@
 #include "DeviceStateCommands.h"
 
+#include "Cli.h"
+#include "LoadedModuleReport.h"
+#include "ProcessReport.h"
+#include "SettingsReport.h"
+#include "_ZantDevice.h"
+
+namespace {
+
+int settings(Cli& cli, const QStringList& arguments)
+{
+    int status = ExitSuccess;
+    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
+    if (!device)
+        return status;
+    // Depth first from the root, each node before its children, children in device order.
+    QVector<_SettingsInfo> nodes;
+    QStringList pending {QStringLiteral("/")};
+    while (!pending.isEmpty()) {
+        auto node = QSharedPointer<_SettingsInfo>::create();
+        node->SetPath(pending.takeLast());
+        if (const int result = device->GetChildSettings(node))
+            return cli.gatewayFailure(QStringLiteral("reading the settings at %1").arg(node->Path()), result, device.get());
+        for (auto child = node->children.crbegin(); child != node->children.crend(); ++child)
+            pending.append((*child)->Path());
+        nodes.append(*node);
+    }
+    return cli.emitReport(SettingsReport::build(nodes));
+}
+
+int processes(Cli& cli, const QStringList& arguments)
+{
+    int status = ExitSuccess;
+    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
+    if (!device)
+        return status;
+    QVector<ProcessInfo> found;
+    if (const int result = device->GetProcesses(found))
+        return cli.gatewayFailure(QStringLiteral("reading the processes"), result, device.get());
+    return cli.emitReport(ProcessReport::build(found));
+}
+
+int loadedModules(Cli& cli, const QStringList& arguments)
+{
+    int status = ExitSuccess;
+    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
+    if (!device)
+        return status;
+    QVector<LoadedModuleInfo> found;
+    if (const int result = device->GetLoadedModules(found))
+        return cli.gatewayFailure(QStringLiteral("reading the loaded modules"), result, device.get());
+    return cli.emitReport(LoadedModuleReport::build(found));
+}
+
+} // namespace
+
 QVector<CliCommand> deviceStateCommands()
 {
-    return {};
+    return {
+        {QStringLiteral("settings"), QStringLiteral("DEVICE"), QStringLiteral("Write the settings store"),
+         QStringLiteral("Every node of the store from the root, each before its children, with its path and\n"
+                        "its values."),
+         1, 1, settings},
+        {QStringLiteral("processes"), QStringLiteral("DEVICE"), QStringLiteral("List the processes and their threads"),
+         QStringLiteral("What the Threads page shows, processes and threads by ascending id."), 1, 1, processes},
+        {QStringLiteral("loaded-modules"), QStringLiteral("DEVICE"), QStringLiteral("List the modules each process loaded"),
+         QStringLiteral("What the Loaded Modules page shows, processes and modules by ascending id."), 1, 1, loadedModules},
+    };
 }

@@ -90,6 +90,13 @@ int _ZantDevice::call(Operation operation, const QByteArray& request, QByteArray
             signatureLockRequest = true;
         if (error)
             *error = connection.errorString();
+    } else if (result != 0 && !attaching && body && !body->isEmpty()) {
+        // A refusal that says why: that is the device's word for the user.
+        PayloadStream in(*body);
+        QString reason;
+        in >> reason;
+        if (in.ok() && !reason.isEmpty())
+            statusText = reason;
     }
     return result;
 }

@@ -43,7 +43,9 @@ public:
     _ZantDevice& operator=(const _ZantDevice&) = delete;
 
     QString name;          // display name, e.g. "Zantro Simulator - NAME"
-    QString statusText;    // the device's last word on a connection or installation
+    // The device's last word on a connection or installation, or why it refused a request
+    // when it said so.
+    QString statusText;
     // Set to ask the device to leave the mode; sent with the next call, then cleared.
     std::atomic<bool> serviceLockRequest { false };
     std::atomic<bool> signatureLockRequest { false };

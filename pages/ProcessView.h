@@ -21,9 +21,6 @@ public:
 
     explicit ProcessView(QWidget* parent = nullptr);
 
-    // "Included", "Default", "Excluded", "Hard Excluded", else "Unknown:" and the value.
-    static QString threadStateText(quint32 state);
-
 public slots:
     QString componentName() override;
 

@@ -23,7 +23,9 @@
 //
 // Every answer payload starts with `qint32 result` (0 = success, else a code from
 // PortlexErrors.h or one the device chooses); the fields listed under "answer" follow the
-// result and are present when the result is 0 unless stated otherwise.
+// result and are present when the result is 0 unless stated otherwise. A failure may
+// instead carry a QString saying why (a refused path, a read-only folder); the client keeps
+// it as the device's status text.
 //
 // Still working: while a request takes long, the device may send any number of frames
 // with the StillWorking flag, the request's id and operation and an empty payload before

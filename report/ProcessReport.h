@@ -1,0 +1,17 @@
+#pragma once
+
+#include "ProcessInfo.h"
+#include "Report.h"
+
+#include <QString>
+#include <QVector>
+
+// The device's processes with their threads, as the threads page shows them: the
+// "zant-processes" document, processes and threads in the device's (ascending id) order.
+class ProcessReport
+{
+public:
+    // "Included", "Default", "Excluded", "Hard Excluded", else "Unknown:" and the value.
+    static QString threadStateText(quint32 state);
+    static Report build(const QVector<ProcessInfo>& processes);
+};

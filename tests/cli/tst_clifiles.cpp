@@ -1,0 +1,170 @@
+#include "CliRun.h"
+#include "PortlexErrors.h"
+#include "ProcessReport.h"
+#include "SimulatorProcess.h"
+#include "TestSupport.h"
+#include "_ZantDevice.h"
+
+#include <QJsonArray>
+#include <QJsonDocument>
+#include <QTemporaryDir>
+#include <QtTest>
+
+using namespace TestSupport;
+
+// The file and device state commands against the sample handset: what they write is what
+// the gateway answers, and a refusal reaches the user with the device's reason.
+class TestCliFiles : public QObject
+{
+    Q_OBJECT
+
+    QTemporaryDir m_sockets, m_package;
+    std::unique_ptr<QTemporaryDir> m_local;
+    SimulatorProcess m_simulator { m_sockets.path() };
+    QSharedPointer<_ZantDevice> m_device;
+    QString local(const QString& name) const { return m_local->filePath(name); }
+    // A command's CSV lines, header first.
+    static QStringList csv(const QStringList& arguments)
+    {
+        return QString::fromUtf8(runCli(QStringList {"--format", "csv"} + arguments).out).split('\n', Qt::SkipEmptyParts);
+    }
+
+private slots:
+    void initTestCase()
+    {
+        qputenv("ZANTRO_SIM_DIR", QFile::encodeName(m_sockets.path()));
+        m_device = m_simulator.connectDevice(SimulatorProcess::sampleImage("handset"), "kestrel-k7");
+        QVERIFY(m_device && writeFile(m_package.filePath("demo/demo.mod"), "module"));
+        QCOMPARE(QProcess::execute(SimulatorProcess::executable(), {"pack", m_package.filePath("demo"), m_package.filePath("demo.zantro")}), 0);
+    }
+    void init() { m_local = std::make_unique<QTemporaryDir>(); }
+
+    void pushThenPull_data()
+    {
+        QTest::addColumn<int>("size");
+        QTest::newRow("empty") << 0;
+        QTest::newRow("one byte") << 1;
+        QTest::newRow("one over a chunk") << int(Protocol::TransferChunkSize) + 1;
+    }
+    // A device folder ending in "/" and an existing local folder keep the file's name.
+    // Nothing is printed when stderr is no terminal.
+    void pushThenPull()
+    {
+        QFETCH(int, size);
+        const QString name = QStringLiteral("sent-%1.bin").arg(size);
+        const QByteArray bytes = randomBytes(size, quint32(size) + 7);
+        QVERIFY(writeFile(local(name), bytes) && QDir().mkpath(local("back")));
+        const CliRun pushed = runCli({"push", "kestrel", local(name), "/user/"});
+        const CliRun pulled = runCli({"pull", "kestrel", "/user/" + name, local("back")});
+        QVERIFY(pushed.exitCode == 0 && pulled.exitCode == 0);
+        QCOMPARE(readFile(local("back/" + name)), bytes);
+        QCOMPARE(pushed.out + pushed.err + pulled.out + pulled.err, QByteArray());
+    }
+
+    void refusals_data()
+    {
+        QTest::addColumn<QStringList>("arguments");
+        QTest::addColumn<int>("exitCode");
+        QTest::addColumn<QString>("reason");
+        const QString readOnly = "system module folders are read-only", code = "error %1";
+        QTest::newRow("push outside the volume") << QStringList {"push", "kestrel", "SOURCE", "/../out.bin"} << 4 << code.arg(PortlexError::PathRefused);
+        QTest::newRow("push into a system folder") << QStringList {"push", "kestrel", "SOURCE", "/sys/mod/a.bin"} << 4 << readOnly;
+        QTest::newRow("remove a system folder") << QStringList {"rm", "kestrel", "/sys/mod"} << 4 << readOnly;
+        QTest::newRow("pull a missing file") << QStringList {"pull", "kestrel", "/user/none.bin", "LOCAL"} << 4 << code.arg(PortlexError::NotFound);
+        QTest::newRow("install no package") << QStringList {"--volume", "/", "install", "kestrel", "SOURCE"} << 4 << "not a readable ZIP";
+        QTest::newRow("install onto no volume") << QStringList {"--volume", "9", "install", "kestrel", "PACKAGE"} << 2 << "no volume 9";
+    }
+    // The device's reason, or the code when it gives none, and nothing left behind here.
+    void refusals()
+    {
+        QFETCH(QStringList, arguments);
+        QFETCH(int, exitCode);
+        QFETCH(QString, reason);
+        QVERIFY(writeFile(local("source.bin"), "bytes"));
+        arguments.replaceInStrings("SOURCE", local("source.bin")).replaceInStrings("LOCAL", m_local->path());
+        const CliRun run = runCli(arguments.replaceInStrings("PACKAGE", m_package.filePath("demo.zantro")));
+        QCOMPARE(run.exitCode, exitCode);
+        QVERIFY2(run.err.contains(reason.toUtf8()), run.err.constData());
+        QCOMPARE(treeEntries(m_local->path()), QStringList {"source.bin"});
+    }
+
+    // ls, processes, loaded-modules and settings write what the gateway answers.
+    void stateIsTheGatewaysAnswer()
+    {
+        QSharedPointer<_DirectoryInfo> level;
+        QVector<ProcessInfo> processes;
+        QVector<LoadedModuleInfo> loaded;
+        QVERIFY(runCli({"push", "kestrel", m_package.filePath("demo.zantro"), "/user/"}).exitCode == 0);
+        QVERIFY(m_device->GetFileSystemLevel("/user", level, nullptr, nullptr) == 0 && m_device->GetProcesses(processes) == 0
+                && m_device->GetLoadedModules(loaded) == 0 && !level->directories.isEmpty() && !level->files.isEmpty());
+        QStringList entries {"type,name,path,size,attributes"}, threads {"process.name,process.id,name,id,state,priority"},
+            modules {"process.name,process.id,name,size,location"};
+        for (const auto& folder : std::as_const(level->directories))
+            entries << QStringList {"folder", folder->Name(), folder->Path(), "", ""}.join(',');
+        for (const auto& file : std::as_const(level->files))
+            entries << QStringList {"file", file->Name(), file->Path(), QString::number(file->size), file->Attributes()}.join(',');
+        for (const ProcessInfo& process : std::as_const(processes))
+            for (const ThreadEntry& t : process.threads)
+                threads << QStringList {process.name, QString::number(process.id), t.name, QString::number(t.id),
+                                        ProcessReport::threadStateText(t.state), QString::number(t.priority)}.join(',');
+        for (const LoadedModuleInfo& process : std::as_const(loaded))
+            for (const LoadedModuleEntry& m : process.modules)
+                modules << QStringList {process.name, QString::number(process.id), m.name, QString::number(m.size), m.location}.join(',');
+        QCOMPARE(csv({"ls", "kestrel", "/user"}), entries);
+        QCOMPARE(csv({"processes", "kestrel"}), threads);
+        QCOMPARE(csv({"loaded-modules", "kestrel"}), modules);
+        // Every node with its values, each before its children.
+        QStringList nodes, written, pending {"/"};
+        while (!pending.isEmpty()) {
+            auto node = QSharedPointer<_SettingsInfo>::create("", pending.takeLast());
+            QCOMPARE(m_device->GetChildSettings(node), 0);
+            QStringList fields {node->Path()};
+            for (const auto& value : std::as_const(node->values))
+                fields << value.first << value.second;
+            nodes << fields.join('|');
+            for (auto child = node->children.crbegin(); child != node->children.crend(); ++child)
+                pending << (*child)->Path();
+        }
+        for (const QJsonValue& node : QJsonDocument::fromJson(runCli({"--format", "json", "settings", "kestrel"}).out)["node"].toArray()) {
+            QStringList fields {node["path"].toString()};
+            for (const QJsonValue& value : node["value"].toArray())
+                fields << value["name"].toString() << value["value"].toString();
+            written << fields.join('|');
+        }
+        QVERIFY(nodes.size() > 1 && written == nodes);
+    }
+
+    void installRunRemove()
+    {
+        const CliRun installed = runCli({"install", "kestrel", m_package.filePath("demo.zantro")});
+        QVERIFY2(installed.exitCode == 0 && installed.out.contains("demo.zantro installed"), installed.out.constData());
+        QCOMPARE(runCli({"run", "kestrel", "/usermod/demo/demo.mod"}).exitCode, 0);
+        QVERIFY(!csv({"processes", "kestrel"}).filter(QRegularExpression("^demo,")).isEmpty());
+        QCOMPARE(runCli({"rm", "kestrel", "/usermod/demo"}).exitCode, 0);
+        QCOMPARE(csv({"ls", "kestrel", "/usermod"}).filter("/usermod/demo"), QStringList());
+    }
+
+    // A device that stops answering once the copy began: the call times out.
+    void pausedDeviceEndsTheCommand()
+    {
+        SimulatorProcess slow(m_sockets.path());
+        QVERIFY(slow.start(SimulatorProcess::sampleImage("handset"), "slow-k7", {"--latency", "200"}));
+        const QString source = local("slow.bin");
+        QVERIFY(writeFile(source, randomBytes(3 * Protocol::TransferChunkSize, 3)));
+        QProcess cli;
+        cli.start(QCoreApplication::applicationDirPath() + "/delvix-cli", {"push", "slow-k7", source, "/user/slow.bin"});
+        // The source is opened once the device is connected.
+        QVERIFY(QTest::qWaitFor([&] {
+            const QFileInfoList fds = QDir(QStringLiteral("/proc/%1/fd").arg(cli.processId())).entryInfoList(QDir::AllEntries | QDir::System);
+            return std::any_of(fds.cbegin(), fds.cend(), [&](const QFileInfo& fd) { return fd.symLinkTarget() == source; });
+        }, 30000));
+        slow.pause();
+        const bool ended = cli.waitForFinished(60000);
+        slow.resume();
+        QVERIFY(ended && cli.exitCode() == 4);
+        QVERIFY(cli.readAllStandardError().contains(QByteArray::number(PortlexError::Timeout)));
+    }
+};
+
+QTEST_GUILESS_MAIN(TestCliFiles)
+#include "tst_clifiles.moc"
