@@ -25,10 +25,10 @@ int mifOfFile(Cli& cli, const QString& path)
     return cli.emitReport(MifEntryReport::build(entry));
 }
 
-int mifOfModule(Cli& cli, const QString& spec, const QString& module)
+int mifOfModule(Cli& cli, const QString& deviceName, const QString& module)
 {
     int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(spec, &status);
+    const QSharedPointer<_ZantDevice> device = cli.connect(deviceName, &status);
     if (!device)
         return status;
     QVector<ModuleInfo> modules;
@@ -46,7 +46,7 @@ int mifOfModule(Cli& cli, const QString& spec, const QString& module)
     if (paths.isEmpty()) {
         return cli.fail(ExitGatewayError,
             QStringLiteral("%1 has no module \"%2\" (\"delvix-cli modules %1\" lists them)")
-                .arg(spec, module));
+                .arg(deviceName, module));
     }
     if (paths.size() > 1) {
         return cli.fail(ExitUsage,

@@ -11,9 +11,6 @@
 #include "PageBenchDevice.h"
 #include "Portlex.h"
 
-#include <algorithm>
-#include <cstdio>
-#include <fcntl.h>
 #include <QApplication>
 #include <QCommandLineParser>
 #include <QElapsedTimer>
@@ -22,10 +19,17 @@
 #include <QProcess>
 #include <QTemporaryDir>
 #include <QTextStream>
+
+#include <fcntl.h>
 #include <spawn.h>
 #include <sys/resource.h>
 #include <sys/wait.h>
+#include <time.h>
 #include <unistd.h>
+
+#include <algorithm>
+#include <cstdio>
+#include <cstring>
 
 extern char** environ;
 
@@ -47,38 +51,46 @@ struct Run
     qint64 outputBytes = 0;
 };
 
-// Runs the tool with its output in a file, as a pipeline would redirect it, and takes its
-// resource use from wait4: the benchmark's own memory does not count.
+// The launcher: "bench_cli --launch OUTPUT TOOL ARGUMENTS..." runs the tool with its output
+// in OUTPUT, as a pipeline would redirect it, and prints "status wall-ms peak-kB". It is a
+// fresh small process on purpose: a child takes over, as its peak, the resident memory of
+// the process it was spawned from, and this benchmark's own is larger than the tool's. (A
+// figure below the launcher's own, about 16 MB, reads as that.)
+int launch(char** argv)
+{
+    posix_spawn_file_actions_t files;
+    posix_spawn_file_actions_init(&files);
+    posix_spawn_file_actions_addopen(&files, STDOUT_FILENO, argv[2], O_WRONLY | O_CREAT | O_TRUNC, 0600);
+    timespec start {}, end {};
+    clock_gettime(CLOCK_MONOTONIC, &start);
+    pid_t child = 0;
+    int status = 0;
+    rusage usage {};
+    if (posix_spawn(&child, argv[3], &files, nullptr, argv + 3, environ) != 0
+        || wait4(child, &status, 0, &usage) != child)
+        return 1;
+    posix_spawn_file_actions_destroy(&files);
+    clock_gettime(CLOCK_MONOTONIC, &end);
+    const long long wallMs = (end.tv_sec - start.tv_sec) * 1000LL + (end.tv_nsec - start.tv_nsec) / 1000000;
+    std::printf("%d %lld %ld\n", WIFEXITED(status) ? WEXITSTATUS(status) : -1, wallMs, usage.ru_maxrss);
+    return 0;
+}
+
 Run runTool(const QString& tool, const QStringList& arguments, const QString& outputPath)
 {
     Run run;
-    QList<QByteArray> storage {QFile::encodeName(tool)};
-    for (const QString& argument : arguments)
-        storage.append(argument.toLocal8Bit());
-    std::vector<char*> argv;
-    for (QByteArray& bytes : storage)
-        argv.push_back(bytes.data());
-    argv.push_back(nullptr);
-
-    posix_spawn_file_actions_t files;
-    posix_spawn_file_actions_init(&files);
-    const QByteArray output = QFile::encodeName(outputPath);
-    posix_spawn_file_actions_addopen(
-        &files, STDOUT_FILENO, output.constData(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
-    QElapsedTimer wall;
-    wall.start();
-    pid_t child = 0;
-    const int spawned = posix_spawn(&child, argv[0], &files, nullptr, argv.data(), environ);
-    posix_spawn_file_actions_destroy(&files);
-    if (spawned != 0)
+    QProcess launcher;
+    launcher.setProcessChannelMode(QProcess::ForwardedErrorChannel);
+    launcher.start(QCoreApplication::applicationFilePath(),
+        QStringList {QStringLiteral("--launch"), outputPath, tool} + arguments);
+    if (!launcher.waitForFinished(-1) || launcher.exitCode() != 0)
         return run;
-    int status = 0;
-    rusage usage {};
-    if (wait4(child, &status, 0, &usage) != child)
+    const QList<QByteArray> figures = launcher.readAllStandardOutput().simplified().split(' ');
+    if (figures.size() != 3)
         return run;
-    run.wallMs = wall.elapsed();
-    run.peakKb = usage.ru_maxrss;
-    run.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+    run.status = figures.at(0).toInt();
+    run.wallMs = figures.at(1).toLongLong();
+    run.peakKb = figures.at(2).toLong();
     run.outputBytes = QFile(outputPath).size();
     return run;
 }
@@ -95,6 +107,7 @@ void benchCommand(const QString& command, int runs, const QString& outputPath)
     QVector<qint64> walls;
     QVector<long> peaks;
     out() << QStringLiteral("delvix-cli %1 %2:\n").arg(command, DeviceId);
+    out().flush();
     for (int i = 0; i < runs; ++i) {
         const Run run = runTool(tool, {command, DeviceId}, outputPath);
         out() << QStringLiteral("  run %1: exit %2, %3 ms, peak %4 MB, %5 KB written\n")
@@ -142,6 +155,8 @@ void reportPage(const QString& name, GatewayComponentWidget* page, const QTableW
 
 int main(int argc, char** argv)
 {
+    if (argc > 3 && std::strcmp(argv[1], "--launch") == 0)
+        return launch(argv);
     QTemporaryDir work;
     useOffscreenAndWorkSettings(work);
     QApplication app(argc, argv);
