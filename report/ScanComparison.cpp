@@ -1,7 +1,5 @@
 #include "ScanComparison.h"
 
-#include "XmlReport.h"
-
 namespace {
 
 QString classCount(qsizetype count)
@@ -79,28 +77,26 @@ QString ScanComparison::summary() const
     return parts.join(QStringLiteral(", "));
 }
 
-QString ScanComparison::xml() const
+Report ScanComparison::report() const
 {
-    XmlReport report(QStringLiteral("platform-comparison"));
-    QXmlStreamWriter& xml = report.writer();
-    xml.writeStartElement(QStringLiteral("PlatformComparison"));
+    Report report(
+        QStringLiteral("platform-comparison"), QStringLiteral("PlatformComparison"), QStringLiteral("class"));
+    ReportNode& root = report.root();
+    root.children.reserve(m_scans.size() + m_classes.size());
     for (int s = 0; s < m_scans.size(); ++s) {
-        xml.writeStartElement(QStringLiteral("scan"));
-        xml.writeAttribute(QStringLiteral("id"), scanAttribute(s));
-        xml.writeAttribute(QStringLiteral("name"), m_scans.at(s));
-        xml.writeEndElement();
+        root.add(QStringLiteral("scan"))
+            .set(QStringLiteral("id"), scanAttribute(s))
+            .set(QStringLiteral("name"), m_scans.at(s));
     }
     for (int c = 0; c < m_classes.size(); ++c) {
         const Class& entry = m_classes.at(c);
-        xml.writeStartElement(QStringLiteral("class"));
-        xml.writeAttribute(QStringLiteral("name"), entry.name);
-        xml.writeAttribute(QStringLiteral("value"), entry.id);
-        xml.writeAttribute(QStringLiteral("family"), entry.family);
-        xml.writeAttribute(QStringLiteral("subfamily"), entry.subFamily);
+        ReportNode& row = root.add(QStringLiteral("class"))
+                              .set(QStringLiteral("name"), entry.name)
+                              .set(QStringLiteral("value"), entry.id)
+                              .set(QStringLiteral("family"), entry.family)
+                              .set(QStringLiteral("subfamily"), entry.subFamily);
         for (int s = 0; s < m_scans.size(); ++s)
-            xml.writeAttribute(
-                scanAttribute(s), isPresent(c, s) ? QStringLiteral("yes") : QStringLiteral("no"));
-        xml.writeEndElement();
+            row.set(scanAttribute(s), isPresent(c, s) ? QStringLiteral("yes") : QStringLiteral("no"));
     }
-    return report.text();
+    return report;
 }

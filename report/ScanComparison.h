@@ -1,5 +1,7 @@
 #pragma once
 
+#include "Report.h"
+
 #include <QBitArray>
 #include <QHash>
 #include <QString>
@@ -36,8 +38,8 @@ public:
     // "N classes in both, A only in X, B only in Y" ("all" beyond two scans); empty with no scan.
     QString summary() const;
     // The "platform-comparison" document: the scans, then every class in the order first met,
-    // with one presence attribute per scan.
-    QString xml() const;
+    // with one presence attribute per scan (the CSV lines are the classes).
+    Report report() const;
 
 private:
     QStringList m_scans;

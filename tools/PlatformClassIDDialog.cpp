@@ -4,8 +4,8 @@
 #include "EnsureWindowPlacementOnDesktop.h"
 #include "FreeFormProgressDialog.h"
 #include "NameLibrary.h"
+#include "PlatformScanReport.h"
 #include "SaveXmlReport.h"
-#include "XmlReport.h"
 
 #include <QHeaderView>
 #include <QSettings>
@@ -57,14 +57,6 @@ void PlatformClassIDDialog::setProgressDialog(FreeFormProgressDialog* progress)
 
 void PlatformClassIDDialog::populate(const std::vector<MifEntry>& entries)
 {
-    XmlReport report(QStringLiteral("platform-scan"));
-    QXmlStreamWriter& xml = report.writer();
-    xml.writeStartElement(QStringLiteral("ZTOINFO"));
-    xml.writeStartElement(QStringLiteral("ZTOVERSION"));
-    xml.writeAttribute(QStringLiteral("version"), QString());
-    xml.writeEndElement();
-    xml.writeStartElement(QStringLiteral("ZantHeaderDataList"));
-
     if (m_progress
         && FreeFormProgressDialog::progressCallback(
             m_progress, 0, int(entries.size()), tr("Processing MIF Entries")))
@@ -78,6 +70,8 @@ void PlatformClassIDDialog::populate(const std::vector<MifEntry>& entries)
     table->setSortingEnabled(false);
     int row = table->rowCount();
     table->setRowCount(int(row + total));
+    QVector<QStringList> scanned;
+    scanned.reserve(total);
 
     int index = 0;
     for (const MifEntry& entry : entries) {
@@ -89,19 +83,11 @@ void PlatformClassIDDialog::populate(const std::vector<MifEntry>& entries)
             return;
         }
         for (const quint32 id : entry.classes) {
-            QString idText, name, family, subFamily;
-            lookupClass(id, idText, name, family, subFamily);
-            int column = 0;
-            for (const QString& text : {name, idText, family, subFamily, entry.filePath})
-                table->setItem(row, column++, new CITableWidgetItem(text));
+            QStringList cells = PlatformScanReport::cells(id, entry.filePath);
+            for (int column = 0; column < cells.size(); ++column)
+                table->setItem(row, column, new CITableWidgetItem(cells.at(column)));
             ++row;
-
-            xml.writeStartElement(QStringLiteral("ZTOId"));
-            xml.writeAttribute(QStringLiteral("name"), name);
-            xml.writeAttribute(QStringLiteral("value"), idText);
-            xml.writeAttribute(QStringLiteral("family"), family);
-            xml.writeAttribute(QStringLiteral("subfamily"), subFamily);
-            xml.writeEndElement();
+            scanned.append(std::move(cells));
         }
     }
 
@@ -109,7 +95,7 @@ void PlatformClassIDDialog::populate(const std::vector<MifEntry>& entries)
     table->horizontalHeader()->setSortIndicator(0, Qt::AscendingOrder);
     table->setSortingEnabled(true);
     table->resizeColumnsToContents();
-    m_xml = report.text();
+    m_xml = PlatformScanReport::build(scanned).toXml();
 }
 
 void PlatformClassIDDialog::on__saveClassIDsButton_clicked()

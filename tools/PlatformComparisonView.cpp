@@ -147,5 +147,5 @@ void PlatformComparisonView::refreshSummary()
 
 QString PlatformComparisonView::exportText() const
 {
-    return m_comparison.scans().isEmpty() ? QString() : m_comparison.xml();
+    return m_comparison.scans().isEmpty() ? QString() : m_comparison.report().toXml();
 }
