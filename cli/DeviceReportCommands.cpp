@@ -110,9 +110,6 @@ QString levelFile(Cli& cli, const QString& name, int* status)
     }
     if (matches.size() == 1)
         return matches.first();
-    known.sort(Qt::CaseInsensitive);
-    known.removeDuplicates();
-    const QString levels = known.isEmpty() ? QStringLiteral("none") : known.join(QStringLiteral(", "));
     if (matches.size() > 1) {
         *status = cli.fail(ExitUsage, QStringLiteral("\"%1\" names several level files: %2")
                                           .arg(name, matches.join(QStringLiteral(", "))));
@@ -122,7 +119,10 @@ QString levelFile(Cli& cli, const QString& name, int* status)
     if (name.contains(QLatin1Char('/')) || name.contains(QDir::separator()) || name.contains(QLatin1String(".xml"))
         || QFileInfo::exists(name))
         return name;
-    *status = cli.fail(ExitUsage, QStringLiteral("no level \"%1\"; the known levels are: %2").arg(name, levels));
+    known.sort(Qt::CaseInsensitive);
+    known.removeDuplicates();
+    *status = cli.fail(ExitUsage, QStringLiteral("no level \"%1\"; the known levels are: %2")
+                                      .arg(name, known.isEmpty() ? QStringLiteral("none") : known.join(QStringLiteral(", "))));
     return QString();
 }
 
@@ -139,8 +139,7 @@ int level(Cli& cli, const QStringList& arguments)
     QString error;
     if (!LevelReport::check(path, device->cache.classes, &entries, &error))
         return cli.fail(ExitGatewayError, QStringLiteral("cannot read the level %1: %2").arg(path, error));
-    const QVector<IdRecord> records(entries.cbegin(), entries.cend());
-    status = cli.emitReport(FamilyReport::levelReport(FamilyReport::group(records, LevelReport::cells)));
+    status = cli.emitReport(FamilyReport::levelReport(FamilyReport::group(entries, LevelReport::cells)));
     if (status != ExitSuccess)
         return status;
     const bool met = std::all_of(entries.cbegin(), entries.cend(), [](const IdRecord& entry) { return entry.available; });
