@@ -1,9 +1,20 @@
 #include "DeviceReportCommands.h"
 
 #include "Cli.h"
+#include "ClassReport.h"
 #include "DeviceListReport.h"
+#include "FamilyReport.h"
+#include "LevelFiles.h"
+#include "LevelReport.h"
 #include "ModuleReport.h"
+#include "PhoneInfoReport.h"
 #include "Portlex.h"
+#include "RegistryReport.h"
+
+#include <QDir>
+#include <QFileInfo>
+
+#include <algorithm>
 
 namespace {
 
@@ -31,6 +42,110 @@ int modules(Cli& cli, const QStringList& arguments)
     return cli.emitReport(ModuleReport::build(rows));
 }
 
+int info(Cli& cli, const QStringList& arguments)
+{
+    int status = ExitSuccess;
+    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
+    if (!device)
+        return status;
+    return cli.emitReport(PhoneInfoReport::build(device->cache.deviceData));
+}
+
+int classes(Cli& cli, const QStringList& arguments)
+{
+    int status = ExitSuccess;
+    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
+    if (!device)
+        return status;
+    QVector<QStringList> rows;
+    rows.reserve(device->cache.classes.size());
+    for (const IdRecord& record : std::as_const(device->cache.classes))
+        rows.append(ClassReport::cells(record));
+    Report::sortRows(rows, ClassReport::NameColumn);
+    return cli.emitReport(ClassReport::build(rows, device->cache.deviceData));
+}
+
+int familyTree(Cli& cli, const QStringList& arguments)
+{
+    int status = ExitSuccess;
+    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
+    if (!device)
+        return status;
+    const FamilyReport::Families families =
+        FamilyReport::group(FamilyReport::availableClasses(device->cache.classes), FamilyReport::treeCells);
+    return cli.emitReport(FamilyReport::familyTree(families, device->cache.deviceData));
+}
+
+int registry(Cli& cli, const QStringList& arguments)
+{
+    int status = ExitSuccess;
+    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
+    if (!device)
+        return status;
+    QVector<RegistryInfo> entries;
+    if (const int result = device->GetRegistry(entries, nullptr, nullptr))
+        return cli.gatewayFailure(QStringLiteral("reading the registry"), result, device.get());
+    QVector<QStringList> rows;
+    rows.reserve(entries.size());
+    for (const RegistryInfo& entry : std::as_const(entries))
+        rows.append(RegistryReport::cells(entry));
+    Report::sortRows(rows, RegistryReport::ClassTypeColumn);
+    return cli.emitReport(RegistryReport::build(rows));
+}
+
+// The level file that name stands for: a file of the Levels folder called so (as the level
+// page lists it, or with its extension), or a path. Empty, with the exit status in
+// *status, when it names none or several.
+QString levelFile(Cli& cli, const QString& name, int* status)
+{
+    QStringList files;
+    listLevelFiles(files);
+    QStringList known;
+    QStringList matches;
+    for (const QString& file : std::as_const(files)) {
+        const QFileInfo level(file);
+        known.append(level.baseName());
+        if (name == level.baseName() || name == level.completeBaseName() || name == level.fileName())
+            matches.append(file);
+    }
+    if (matches.size() == 1)
+        return matches.first();
+    if (matches.size() > 1) {
+        *status = cli.fail(ExitUsage, QStringLiteral("\"%1\" names several level files: %2")
+                                          .arg(name, matches.join(QStringLiteral(", "))));
+        return QString();
+    }
+    // A path: it has a folder in it, is a file name, or is there.
+    if (name.contains(QLatin1Char('/')) || name.contains(QDir::separator()) || name.contains(QLatin1String(".xml"))
+        || QFileInfo::exists(name))
+        return name;
+    known.sort(Qt::CaseInsensitive);
+    known.removeDuplicates();
+    *status = cli.fail(ExitUsage, QStringLiteral("no level \"%1\"; the known levels are: %2")
+                                      .arg(name, known.isEmpty() ? QStringLiteral("none") : known.join(QStringLiteral(", "))));
+    return QString();
+}
+
+int level(Cli& cli, const QStringList& arguments)
+{
+    int status = ExitSuccess;
+    const QString path = levelFile(cli, arguments.at(1), &status);
+    if (path.isEmpty())
+        return status;
+    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
+    if (!device)
+        return status;
+    QList<IdRecord> entries;
+    QString error;
+    if (!LevelReport::check(path, device->cache.classes, &entries, &error))
+        return cli.fail(ExitGatewayError, QStringLiteral("cannot read the level %1: %2").arg(path, error));
+    status = cli.emitReport(FamilyReport::levelReport(FamilyReport::group(entries, LevelReport::cells)));
+    if (status != ExitSuccess)
+        return status;
+    const bool met = std::all_of(entries.cbegin(), entries.cend(), [](const IdRecord& entry) { return entry.available; });
+    return met ? ExitSuccess : ExitFinding;
+}
+
 } // namespace
 
 QVector<CliCommand> deviceReportCommands()
@@ -40,5 +155,26 @@ QVector<CliCommand> deviceReportCommands()
          QStringLiteral("Each device's id and display name, in the gateway's order."), 0, 0, devices},
         {QStringLiteral("modules"), QStringLiteral("DEVICE"), QStringLiteral("List the installed modules"),
          QStringLiteral("The document the Modules page exports, sorted by name."), 1, 1, modules},
+        {QStringLiteral("info"), QStringLiteral("DEVICE"), QStringLiteral("Show the device's facts"),
+         QStringLiteral("The document the Phone Information page exports (\"phone-info\"): hardware, device and\n"
+                        "Zant facts with the page's texts, and the media formats by format name."),
+         1, 1, info},
+        {QStringLiteral("classes"), QStringLiteral("DEVICE"), QStringLiteral("List the classes the device knows"),
+         QStringLiteral("The document the Class IDs page exports, every class of the device, sorted by name."), 1, 1,
+         classes},
+        {QStringLiteral("family-tree"), QStringLiteral("DEVICE"), QStringLiteral("Group the available classes by family"),
+         QStringLiteral("The document the Family Tree page exports: families sorted by name without regard to\n"
+                        "letter case, sub-families in the order they first appear, classes by id."),
+         1, 1, familyTree},
+        {QStringLiteral("registry"), QStringLiteral("DEVICE"), QStringLiteral("List the registry entries"),
+         QStringLiteral("The document the Registry page exports, sorted by class type."), 1, 1, registry},
+        {QStringLiteral("level"), QStringLiteral("DEVICE LEVEL"), QStringLiteral("Check the device against a level"),
+         QStringLiteral("The document the Level page exports: each class the level requires under its family\n"
+                        "and sub-family (grouped as \"family-tree\" groups them), \"Found\" or \"Not Found\".\n"
+                        "LEVEL is a level of the Levels folder beside the program, named as the Level page\n"
+                        "lists it, or the path of a level file.\n"
+                        "Exit status 1 when a class is not found (after writing the document), 2 for an\n"
+                        "unknown level, 4 when the level file cannot be read."),
+         2, 2, level},
     };
 }

@@ -2,32 +2,17 @@
 
 #include "CITableWidgetItem.h"
 #include "ClassListViewThread.h"
+#include "ClassReport.h"
 #include "DeviceCache.h"
-#include "XmlReport.h"
 
 #include <QHeaderView>
 
 namespace {
 
-enum Column
-{
-    NameColumn,
-    IdColumn,
-    FamilyColumn,
-    SubFamilyColumn,
-    AvailableColumn,
-    PathColumn
-};
-
 constexpr int RowHeight = 20;
 // Rows measured when the columns are fitted to their contents: all of a short list, a
 // bounded sample of a long one, where measuring a thousand rows stalls the window.
 constexpr int ResizeSampleRows = 100;
-
-QString orUnknown(const QString& text)
-{
-    return text.isEmpty() ? QStringLiteral("unknown") : text;
-}
 
 } // namespace
 
@@ -116,13 +101,9 @@ void ClassListView::appendRow(const IdRecord& record)
 {
     const int row = _classIDTable->rowCount();
     _classIDTable->setRowCount(row + 1);
-    _classIDTable->setItem(row, NameColumn, new CITableWidgetItem(orUnknown(record.name)));
-    _classIDTable->setItem(row, IdColumn, new CITableWidgetItem(record.id));
-    _classIDTable->setItem(row, FamilyColumn, new CITableWidgetItem(orUnknown(record.family)));
-    _classIDTable->setItem(row, SubFamilyColumn, new CITableWidgetItem(orUnknown(record.subFamily)));
-    _classIDTable->setItem(row, AvailableColumn,
-                           new CITableWidgetItem(record.available ? QStringLiteral("Yes") : QStringLiteral("No")));
-    _classIDTable->setItem(row, PathColumn, new CITableWidgetItem(record.source));
+    const QStringList cells = ClassReport::cells(record);
+    for (int column = 0; column < cells.size(); ++column)
+        _classIDTable->setItem(row, column, new CITableWidgetItem(cells.at(column)));
     _classIDTable->setRowHeight(row, RowHeight);
 
     ++m_processed;
@@ -144,7 +125,7 @@ void ClassListView::finish()
 {
     setTableQuiet(false);
     // Enabling sorting sorts by the indicator; sortByColumn afterwards would sort again.
-    _classIDTable->horizontalHeader()->setSortIndicator(NameColumn, Qt::AscendingOrder);
+    _classIDTable->horizontalHeader()->setSortIndicator(ClassReport::NameColumn, Qt::AscendingOrder);
     _classIDTable->setSortingEnabled(true);
     _classIDTable->resizeColumnsToContents();
     setStatus(readyStatus());
@@ -165,31 +146,8 @@ void ClassListView::onTableDoubleClick(QTableWidgetItem* item)
 
 QString ClassListView::xmlReport()
 {
-    if (!m_report.isEmpty())
-        return m_report;
     // Without a record the document keeps its shape, with empty device texts.
-    const DeviceData data = m_record ? m_record->deviceData : DeviceData();
-    XmlReport report(QStringLiteral("zant-class-ids"));
-    QXmlStreamWriter& xml = report.writer();
-    xml.writeStartElement(QStringLiteral("ZTOINFO"));
-    xml.writeStartElement(QStringLiteral("ZTOVERSION"));
-    xml.writeAttribute(QStringLiteral("version"), data.zantVersion);
-    xml.writeAttribute(QStringLiteral("target"), data.targetId);
-    xml.writeAttribute(QStringLiteral("manufacturer"), data.hardwareValue(QStringLiteral("Manufacturer"), QString()));
-    xml.writeAttribute(QStringLiteral("model"), data.hardwareValue(QStringLiteral("Model"), QString()));
-    xml.writeEndElement();
-
-    xml.writeStartElement(QStringLiteral("ZantHeaderDataList"));
-    const auto cell = [this](int row, int column) { return _classIDTable->item(row, column)->text(); };
-    for (int row = 0; row < _classIDTable->rowCount(); ++row) {
-        xml.writeStartElement(QStringLiteral("ZTOId"));
-        xml.writeAttribute(QStringLiteral("path"), cell(row, PathColumn));
-        xml.writeAttribute(QStringLiteral("subfamily"), cell(row, SubFamilyColumn));
-        xml.writeAttribute(QStringLiteral("family"), cell(row, FamilyColumn));
-        xml.writeAttribute(QStringLiteral("value"), cell(row, IdColumn));
-        xml.writeAttribute(QStringLiteral("name"), cell(row, NameColumn));
-        xml.writeEndElement();
-    }
-    m_report = report.text();
+    if (m_report.isEmpty())
+        m_report = ClassReport::build(tableRows(_classIDTable), m_record ? m_record->deviceData : DeviceData()).toXml();
     return m_report;
 }

@@ -3,7 +3,6 @@
 #include "CITreeWidgetItem.h"
 
 #include <QTreeWidget>
-#include <QXmlStreamWriter>
 
 QTreeWidgetItem* FamilyGrouping::findFamily(const QTreeWidget* tree, const QString& family)
 {
@@ -27,25 +26,24 @@ QTreeWidgetItem* FamilyGrouping::addSubFamily(QTreeWidgetItem* family, const QSt
     return item;
 }
 
-void FamilyGrouping::writeFamilies(QXmlStreamWriter& xml, const QTreeWidget* tree,
-                                   const QList<QPair<QString, int>>& classAttributes)
+FamilyReport::Families FamilyGrouping::families(const QTreeWidget* tree, const QList<int>& classColumns)
 {
+    FamilyReport::Families families;
+    families.reserve(tree->topLevelItemCount());
     for (int f = 0; f < tree->topLevelItemCount(); ++f) {
-        const QTreeWidgetItem* family = tree->topLevelItem(f);
-        xml.writeStartElement(QStringLiteral("family"));
-        xml.writeAttribute(QStringLiteral("name"), family->text(FamilyColumn));
-        for (int s = 0; s < family->childCount(); ++s) {
-            const QTreeWidgetItem* subFamily = family->child(s);
-            xml.writeStartElement(QStringLiteral("subfamily"));
-            xml.writeAttribute(QStringLiteral("name"), subFamily->text(SubFamilyColumn));
-            for (int c = 0; c < subFamily->childCount(); ++c) {
-                xml.writeStartElement(QStringLiteral("class"));
-                for (const auto& attribute : classAttributes)
-                    xml.writeAttribute(attribute.first, subFamily->child(c)->text(attribute.second));
-                xml.writeEndElement();
+        const QTreeWidgetItem* familyItem = tree->topLevelItem(f);
+        FamilyReport::Family& family = families.emplace_back(FamilyReport::Family{familyItem->text(FamilyColumn), {}});
+        for (int s = 0; s < familyItem->childCount(); ++s) {
+            const QTreeWidgetItem* subFamilyItem = familyItem->child(s);
+            FamilyReport::SubFamily& subFamily =
+                family.subFamilies.emplace_back(FamilyReport::SubFamily{subFamilyItem->text(SubFamilyColumn), {}});
+            for (int c = 0; c < subFamilyItem->childCount(); ++c) {
+                QStringList cells;
+                for (const int column : classColumns)
+                    cells.append(subFamilyItem->child(c)->text(column));
+                subFamily.classes.append(cells);
             }
-            xml.writeEndElement();
         }
-        xml.writeEndElement();
     }
+    return families;
 }

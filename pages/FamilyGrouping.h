@@ -1,12 +1,12 @@
 #pragma once
 
+#include "FamilyReport.h"
+
 #include <QList>
-#include <QPair>
 #include <QString>
 
 class QTreeWidget;
 class QTreeWidgetItem;
-class QXmlStreamWriter;
 
 // The shape that the family tree and level pages share: families at the top level (text in
 // column 0), sub-families below them (column 1), classes below those.
@@ -23,9 +23,7 @@ public:
     // A new sub-family below family.
     static QTreeWidgetItem* addSubFamily(QTreeWidgetItem* family, const QString& subFamily);
 
-    // One "family" element per top-level item in the tree's order, a "subfamily" element per
-    // child, and a "class" element per grandchild carrying the given (attribute, column)
-    // pairs in their order.
-    static void writeFamilies(QXmlStreamWriter& xml, const QTreeWidget* tree,
-                              const QList<QPair<QString, int>>& classAttributes);
+    // The tree's grouping for its export: the families in the tree's order, each with its
+    // sub-families and their classes' texts in the given columns.
+    static FamilyReport::Families families(const QTreeWidget* tree, const QList<int>& classColumns);
 };

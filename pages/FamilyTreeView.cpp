@@ -4,7 +4,6 @@
 #include "DeviceCache.h"
 #include "FamilyGrouping.h"
 #include "FamilyTreeViewThread.h"
-#include "XmlReport.h"
 
 namespace {
 
@@ -138,17 +137,11 @@ void FamilyTreeView::finish()
 
 QString FamilyTreeView::xmlReport()
 {
-    if (!m_report.isEmpty())
-        return m_report;
     // Without a record the document keeps its shape, with empty device texts.
-    const DeviceData data = m_record ? m_record->deviceData : DeviceData();
-    XmlReport report(QStringLiteral("familyTree"));
-    QXmlStreamWriter& xml = report.writer();
-    xml.writeStartElement(QStringLiteral("deviceTree"));
-    xml.writeAttribute(QStringLiteral("device"), data.targetId);
-    xml.writeAttribute(QStringLiteral("manufacturer"), data.hardwareValue(QStringLiteral("Manufacturer"), QString()));
-    FamilyGrouping::writeFamilies(xml, _familyTree,
-                                  {{QStringLiteral("name"), NameColumn}, {QStringLiteral("classid"), IdColumn}});
-    m_report = report.text();
+    if (m_report.isEmpty()) {
+        m_report = FamilyReport::familyTree(FamilyGrouping::families(_familyTree, {NameColumn, IdColumn}),
+                                            m_record ? m_record->deviceData : DeviceData())
+                       .toXml();
+    }
     return m_report;
 }

@@ -1,14 +1,6 @@
 #include "FamilyTreeViewThread.h"
 
-namespace {
-
-void fillUnknown(QString& text)
-{
-    if (text.isEmpty())
-        text = QStringLiteral("unknown");
-}
-
-} // namespace
+#include "FamilyReport.h"
 
 FamilyTreeViewThread::FamilyTreeViewThread(GatewayComponentWidget* page, IdRecordMap classes, Feed feed)
     : PageWorkerThread(page)
@@ -21,14 +13,9 @@ void FamilyTreeViewThread::work()
 {
     reportStatus(QStringLiteral("Processing Class IDs"), GatewayComponentWidget::Processing);
     QDeadlineTimer nextStep = QDeadlineTimer::current(Qt::PreciseTimer);
-    for (const IdRecord& known : std::as_const(m_classes)) {
-        if (known.available) {
-            IdRecord record = known;
-            fillUnknown(record.name);
-            fillUnknown(record.family);
-            fillUnknown(record.subFamily);
-            m_feed->append(record);
-        }
+    const QVector<IdRecord> shown = FamilyReport::availableClasses(m_classes);
+    for (const IdRecord& record : shown) {
+        m_feed->append(record);
         nextStep += StepMs;
         if (!pauseUntil(nextStep))
             return;

@@ -6,15 +6,15 @@
 
 #include <QSharedPointer>
 
-// Walks a device's classes in ascending id order and queues the available ones for the
-// family tree page, names that are missing given as "unknown", one class per step with a
-// short sleep between. The feed is closed once every class has been looked at.
+// Queues the classes the family tree shows (FamilyReport::availableClasses, in ascending id
+// order) for its page, one class per step with a short sleep between. The feed is closed
+// once every class has been queued.
 class FamilyTreeViewThread : public PageWorkerThread
 {
 public:
     using Feed = QSharedPointer<PageFeed<IdRecord>>;
 
-    // The time of each class, shown or skipped; the steps keep this rate.
+    // The time of each queued class; the steps keep this rate.
     static constexpr unsigned long StepMs = 1;
 
     // classes is a copy: the worker never reads the device's record, which may go first.

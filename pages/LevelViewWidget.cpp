@@ -3,10 +3,9 @@
 #include "CITreeWidgetItem.h"
 #include "DeviceCache.h"
 #include "FamilyGrouping.h"
-#include "LevelDefinition.h"
 #include "LevelFiles.h"
+#include "LevelReport.h"
 #include "NameLibrary.h"
-#include "XmlReport.h"
 
 #include <QFileInfo>
 
@@ -112,15 +111,13 @@ void LevelViewWidget::onCurrentLevelChanged(int index)
     if (path.isEmpty())
         return;
 
-    LevelDefinition level;
-    level.setIdMap(&m_record->classes);
-    if (!level.load(path)) {
+    QList<IdRecord> entries;
+    QString error;
+    if (!LevelReport::check(path, m_record->classes, &entries, &error)) {
         setStatus(QStringLiteral("Level file not found"));
         setState(Failed);
         return;
     }
-    QList<IdRecord> entries;
-    level.copyRecords(entries);
 
     _level1Tree->clear();
     for (const IdRecord& entry : std::as_const(entries))
@@ -155,27 +152,14 @@ void LevelViewWidget::insertEntry(const IdRecord& entry)
     auto* item = new CITreeWidgetItem;
     item->setText(NameColumn, entry.name);
     item->setText(IdColumn, entry.id);
-    if (entry.available) {
-        item->setText(ResultColumn, QStringLiteral("Found"));
-        item->setForeground(ResultColumn, QBrush(Qt::green));
-    } else {
-        item->setText(ResultColumn, QStringLiteral("Not Found"));
-        item->setForeground(ResultColumn, QBrush(Qt::red));
-    }
+    item->setText(ResultColumn, LevelReport::resultText(entry));
+    item->setForeground(ResultColumn, QBrush(entry.available ? Qt::green : Qt::red));
     subFamily->addChild(item);
 }
 
 QString LevelViewWidget::xmlReport()
 {
-    if (!m_report.isEmpty())
-        return m_report;
-    XmlReport report(QStringLiteral("levelreport"));
-    QXmlStreamWriter& xml = report.writer();
-    xml.writeStartElement(QStringLiteral("device"));
-    FamilyGrouping::writeFamilies(xml, _level1Tree,
-                                  {{QStringLiteral("name"), NameColumn},
-                                   {QStringLiteral("classid"), IdColumn},
-                                   {QStringLiteral("available"), ResultColumn}});
-    m_report = report.text();
+    if (m_report.isEmpty())
+        m_report = FamilyReport::levelReport(FamilyGrouping::families(_level1Tree, {NameColumn, IdColumn, ResultColumn})).toXml();
     return m_report;
 }

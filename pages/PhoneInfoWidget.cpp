@@ -1,23 +1,10 @@
 #include "PhoneInfoWidget.h"
 
 #include "DeviceCache.h"
-#include "FormatSize.h"
 #include "NameLibrary.h"
+#include "PhoneInfoReport.h"
 
 #include <QHeaderView>
-
-namespace {
-
-// A size text from the device as a byte count; anything but a plain non-negative decimal
-// number counts as 0 (a negative count would otherwise show as exabytes).
-quint64 sizeValue(const QString& text)
-{
-    bool ok = false;
-    const qint64 value = text.toLongLong(&ok, 10);
-    return ok && value > 0 ? quint64(value) : 0;
-}
-
-} // namespace
 
 PhoneInfoWidget::PhoneInfoWidget(QWidget* parent)
     : GatewayComponentWidget(parent)
@@ -48,11 +35,11 @@ void PhoneInfoWidget::setDeviceRecord(DeviceCache* record)
     _screenWidth->setText(hardware("cxScreen"));
     _screenHeight->setText(hardware("cyScreen"));
 
-    // Only the exact text "Yes" counts.
-    _flipPhone->setChecked(hardware("FlipPhone") == QLatin1String("Yes"));
-    _vibrate->setChecked(hardware("Vibrate") == QLatin1String("Yes"));
-    _locationSupport->setChecked(hardware("LocationSupport") == QLatin1String("Yes"));
-    _penSupport->setChecked(hardware("PenSupport") == QLatin1String("Yes"));
+    const auto feature = [&data](const char* key) { return PhoneInfoReport::hasFeature(data, QLatin1String(key)); };
+    _flipPhone->setChecked(feature("FlipPhone"));
+    _vibrate->setChecked(feature("Vibrate"));
+    _locationSupport->setChecked(feature("LocationSupport"));
+    _penSupport->setChecked(feature("PenSupport"));
 
     _phoneName->setText(data.phoneName);
     _targetID->setText(data.targetId);
@@ -68,10 +55,11 @@ void PhoneInfoWidget::setDeviceRecord(DeviceCache* record)
     _hwid->setText(hardware("HWID"));
     _deviceIDHash->setText(hardware("DeviceIDHash"));
 
-    _totalMemory->setText(formatSize(sizeValue(hardware("HeapMemory"))));
-    _freeMemory->setText(formatSize(sizeValue(hardware("HeapFree"))));
-    _fsSpace->setText(formatSize(sizeValue(hardware("FSTotal"))));
-    _fsFree->setText(formatSize(sizeValue(hardware("FSAvail"))));
+    const auto size = [&data](const char* key) { return PhoneInfoReport::sizeText(data, QLatin1String(key)); };
+    _totalMemory->setText(size("HeapMemory"));
+    _freeMemory->setText(size("HeapFree"));
+    _fsSpace->setText(size("FSTotal"));
+    _fsFree->setText(size("FSAvail"));
 
     fillFormats(_imageFormats, data.imageValues());
     fillFormats(_audioFormats, data.audioValues());
@@ -130,5 +118,6 @@ bool PhoneInfoWidget::isComplete()
 
 QString PhoneInfoWidget::xmlReport()
 {
-    return m_report;
+    // The facts the page shows, from the record it shows them from; empty before one came.
+    return m_record ? PhoneInfoReport::build(m_record->deviceData).toXml() : QString();
 }

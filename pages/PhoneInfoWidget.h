@@ -33,5 +33,4 @@ private:
     static void fillFormats(QTableWidget* table, const QMap<QString, QString>& formats);
 
     DeviceCache* m_record = nullptr;
-    QString m_report;
 };

@@ -3,19 +3,11 @@
 #include "CITableWidgetItem.h"
 #include "Portlex.h"
 #include "RegistryListViewThread.h"
-#include "XmlReport.h"
+#include "RegistryReport.h"
 
 #include <QHeaderView>
 
 namespace {
-
-enum Column
-{
-    ClassTypeColumn,
-    ClassHandlerColumn,
-    FlagsColumn,
-    MimeTypeColumn
-};
 
 constexpr int RowHeight = 20;
 // Rows the header measures when it fits the columns to their contents: every row of a
@@ -41,19 +33,6 @@ RegistryListView::RegistryListView(QWidget* parent)
 const TickPacer& RegistryListView::pacer() const
 {
     return m_pacer;
-}
-
-QString RegistryListView::flagsText(const RegistryInfo& entry)
-{
-    QString flags;
-    if (entry.active)
-        flags = QStringLiteral("Active");
-    if (entry.restricted) {
-        if (!flags.isEmpty())
-            flags += QStringLiteral(" | ");
-        flags += QStringLiteral("Restricted");
-    }
-    return flags;
 }
 
 QString RegistryListView::componentName()
@@ -113,17 +92,16 @@ void RegistryListView::appendRow(const RegistryInfo& entry)
 {
     const int row = _registryTable->rowCount();
     _registryTable->setRowCount(row + 1);
-    _registryTable->setItem(row, ClassTypeColumn, new CITableWidgetItem(QString::number(entry.baseClassId)));
-    _registryTable->setItem(row, ClassHandlerColumn, new CITableWidgetItem(QString::number(entry.handlerClassId)));
-    _registryTable->setItem(row, FlagsColumn, new CITableWidgetItem(flagsText(entry)));
-    _registryTable->setItem(row, MimeTypeColumn, new CITableWidgetItem(entry.mimeType));
+    const QStringList cells = RegistryReport::cells(entry);
+    for (int column = 0; column < cells.size(); ++column)
+        _registryTable->setItem(row, column, new CITableWidgetItem(cells.at(column)));
     _registryTable->setRowHeight(row, RowHeight);
 }
 
 void RegistryListView::finish()
 {
     // Enabling sorting sorts by the indicator; sortByColumn afterwards would sort again.
-    _registryTable->horizontalHeader()->setSortIndicator(ClassTypeColumn, Qt::AscendingOrder);
+    _registryTable->horizontalHeader()->setSortIndicator(RegistryReport::ClassTypeColumn, Qt::AscendingOrder);
     _registryTable->setSortingEnabled(true);
     setStatus(readyStatus());
     setState(Complete);
@@ -143,20 +121,7 @@ void RegistryListView::onTableDoubleClick(QTableWidgetItem* item)
 
 QString RegistryListView::xmlReport()
 {
-    if (!m_report.isEmpty())
-        return m_report;
-    XmlReport report(QStringLiteral("registrylist"));
-    QXmlStreamWriter& xml = report.writer();
-    xml.writeStartElement(QStringLiteral("entries"));
-    const auto cell = [this](int row, int column) { return _registryTable->item(row, column)->text(); };
-    for (int row = 0; row < _registryTable->rowCount(); ++row) {
-        xml.writeStartElement(QStringLiteral("entry"));
-        xml.writeAttribute(QStringLiteral("mime-type"), cell(row, MimeTypeColumn));
-        xml.writeAttribute(QStringLiteral("flags"), cell(row, FlagsColumn));
-        xml.writeAttribute(QStringLiteral("class-handler"), cell(row, ClassHandlerColumn));
-        xml.writeAttribute(QStringLiteral("class-type"), cell(row, ClassTypeColumn));
-        xml.writeEndElement();
-    }
-    m_report = report.text();
+    if (m_report.isEmpty())
+        m_report = RegistryReport::build(tableRows(_registryTable)).toXml();
     return m_report;
 }

@@ -28,9 +28,6 @@ public:
 
     const TickPacer& pacer() const;
 
-    // "Active", "Restricted", both joined by " | ", or nothing.
-    static QString flagsText(const RegistryInfo& entry);
-
 public slots:
     QString componentName() override;
     void startComponent(const QString& deviceId) override;

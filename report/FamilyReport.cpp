@@ -1,0 +1,85 @@
+#include "FamilyReport.h"
+
+#include <algorithm>
+
+namespace {
+
+QString orUnknown(const QString& text)
+{
+    return text.isEmpty() ? QStringLiteral("unknown") : text;
+}
+
+void addFamilies(ReportNode& parent, const FamilyReport::Families& families, const QStringList& classAttributes)
+{
+    for (const FamilyReport::Family& family : families) {
+        ReportNode& familyNode = parent.add(QStringLiteral("family")).set(QStringLiteral("name"), family.name);
+        for (const FamilyReport::SubFamily& subFamily : family.subFamilies) {
+            ReportNode& subFamilyNode = familyNode.add(QStringLiteral("subfamily")).set(QStringLiteral("name"), subFamily.name);
+            for (const QStringList& cells : subFamily.classes) {
+                ReportNode& classNode = subFamilyNode.add(QStringLiteral("class"));
+                for (int column = 0; column < classAttributes.size(); ++column)
+                    classNode.set(classAttributes.at(column), cells.value(column));
+            }
+        }
+    }
+}
+
+} // namespace
+
+QVector<IdRecord> FamilyReport::availableClasses(const IdRecordMap& classes)
+{
+    QVector<IdRecord> shown;
+    for (const IdRecord& known : classes) {
+        if (!known.available)
+            continue;
+        IdRecord record = known;
+        record.name = orUnknown(record.name);
+        record.family = orUnknown(record.family);
+        record.subFamily = orUnknown(record.subFamily);
+        shown.append(record);
+    }
+    return shown;
+}
+
+FamilyReport::Families FamilyReport::group(const QVector<IdRecord>& records,
+                                           const std::function<QStringList(const IdRecord&)>& cells)
+{
+    Families families;
+    for (const IdRecord& record : records) {
+        const auto family = std::find_if(families.begin(), families.end(), [&record](const Family& known) {
+            return QString::compare(known.name, record.family, Qt::CaseInsensitive) == 0;
+        });
+        Family& into = family != families.end() ? *family : families.emplace_back(Family{record.family, {}});
+        const auto subFamily = std::find_if(into.subFamilies.begin(), into.subFamilies.end(),
+                                            [&record](const SubFamily& known) { return known.name == record.subFamily; });
+        SubFamily& under = subFamily != into.subFamilies.end() ? *subFamily
+                                                                : into.subFamilies.emplace_back(SubFamily{record.subFamily, {}});
+        under.classes.append(cells(record));
+    }
+    std::stable_sort(families.begin(), families.end(), [](const Family& a, const Family& b) {
+        return QString::compare(a.name, b.name, Qt::CaseInsensitive) < 0;
+    });
+    return families;
+}
+
+QStringList FamilyReport::treeCells(const IdRecord& record)
+{
+    return {record.name, record.id};
+}
+
+Report FamilyReport::familyTree(const Families& families, const DeviceData& device)
+{
+    Report report(QStringLiteral("familyTree"), QStringLiteral("deviceTree"), QStringLiteral("class"));
+    report.root()
+        .set(QStringLiteral("device"), device.targetId)
+        .set(QStringLiteral("manufacturer"), device.hardwareValue(QStringLiteral("Manufacturer"), QString()));
+    addFamilies(report.root(), families, {QStringLiteral("name"), QStringLiteral("classid")});
+    return report;
+}
+
+Report FamilyReport::levelReport(const Families& families)
+{
+    Report report(QStringLiteral("levelreport"), QStringLiteral("device"), QStringLiteral("class"));
+    addFamilies(report.root(), families, {QStringLiteral("name"), QStringLiteral("classid"), QStringLiteral("available")});
+    return report;
+}
