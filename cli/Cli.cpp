@@ -220,6 +220,13 @@ QSharedPointer<_ZantDevice> Cli::connect(const QString& spec, int* exitCode)
     return device;
 }
 
+int Cli::onDevice(const QString& spec, const std::function<int(_ZantDevice& device)>& work)
+{
+    int status = ExitSuccess;
+    const QSharedPointer<_ZantDevice> device = connect(spec, &status);
+    return device ? work(*device) : status;
+}
+
 int Cli::emitReport(const Report& report)
 {
     const QByteArray bytes = report.write(m_format);

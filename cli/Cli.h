@@ -8,6 +8,8 @@
 #include <QStringList>
 #include <QVector>
 
+#include <functional>
+
 class _ZantDevice;
 
 // The command line tool: reads the arguments, runs one command and gives its exit status.
@@ -23,9 +25,10 @@ public:
     bool failOnDifference() const { return m_failOnDifference; }
     QString volume() const { return m_volume; }
 
-    // The device that spec names (its id, or a unique part of its display name), connected.
-    // Null after the failure is reported; *exitCode then says how the command ends.
-    QSharedPointer<_ZantDevice> connect(const QString& spec, int* exitCode);
+    // Runs work on the device that spec names (its id, or a unique part of its display
+    // name) once it is connected. The exit status is work's, or says how finding or
+    // connecting the device failed.
+    int onDevice(const QString& spec, const std::function<int(_ZantDevice& device)>& work);
 
     // Writes the report in the chosen format to the output: standard output, or the -o
     // file through a save file. Returns the exit status.
@@ -45,6 +48,9 @@ private:
     int usage(const QString& message);
     int help(const CliCommand* command);
     const CliCommand* find(const QString& name) const;
+    // The device that spec names, connected; null after the failure is reported, with the
+    // exit status in *exitCode.
+    QSharedPointer<_ZantDevice> connect(const QString& spec, int* exitCode);
 
     QVector<CliCommand> m_commands;
     QStringList m_arguments;

@@ -27,70 +27,60 @@ int devices(Cli& cli, const QStringList&)
 
 int modules(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    QVector<ModuleInfo> found;
-    if (const int result = device->GetModules(found, nullptr, nullptr))
-        return cli.gatewayFailure(QStringLiteral("reading the modules"), result, device.get());
-    QVector<QStringList> rows;
-    rows.reserve(found.size());
-    for (const ModuleInfo& module : std::as_const(found))
-        rows.append(ModuleReport::cells(module));
-    Report::sortRows(rows, ModuleReport::NameColumn);
-    return cli.emitReport(ModuleReport::build(rows));
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
+        QVector<ModuleInfo> found;
+        if (const int result = device.GetModules(found, nullptr, nullptr))
+            return cli.gatewayFailure(QStringLiteral("reading the modules"), result, &device);
+        QVector<QStringList> rows;
+        rows.reserve(found.size());
+        for (const ModuleInfo& module : std::as_const(found))
+            rows.append(ModuleReport::cells(module));
+        Report::sortRows(rows, ModuleReport::NameColumn);
+        return cli.emitReport(ModuleReport::build(rows));
+    });
 }
 
 int info(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    return cli.emitReport(PhoneInfoReport::build(device->cache.deviceData));
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
+        return cli.emitReport(PhoneInfoReport::build(device.cache.deviceData));
+    });
 }
 
 int classes(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    QVector<QStringList> rows;
-    rows.reserve(device->cache.classes.size());
-    for (const IdRecord& record : std::as_const(device->cache.classes))
-        rows.append(ClassReport::cells(record));
-    Report::sortRows(rows, ClassReport::NameColumn);
-    return cli.emitReport(ClassReport::build(rows, device->cache.deviceData));
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
+        QVector<QStringList> rows;
+        rows.reserve(device.cache.classes.size());
+        for (const IdRecord& record : std::as_const(device.cache.classes))
+            rows.append(ClassReport::cells(record));
+        Report::sortRows(rows, ClassReport::NameColumn);
+        return cli.emitReport(ClassReport::build(rows, device.cache.deviceData));
+    });
 }
 
 int familyTree(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    const FamilyReport::Families families =
-        FamilyReport::group(FamilyReport::availableClasses(device->cache.classes), FamilyReport::treeCells);
-    return cli.emitReport(FamilyReport::familyTree(families, device->cache.deviceData));
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
+        const FamilyReport::Families families =
+            FamilyReport::group(FamilyReport::availableClasses(device.cache.classes), FamilyReport::treeCells);
+        return cli.emitReport(FamilyReport::familyTree(families, device.cache.deviceData));
+    });
 }
 
 int registry(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    QVector<RegistryInfo> entries;
-    if (const int result = device->GetRegistry(entries, nullptr, nullptr))
-        return cli.gatewayFailure(QStringLiteral("reading the registry"), result, device.get());
-    QVector<QStringList> rows;
-    rows.reserve(entries.size());
-    for (const RegistryInfo& entry : std::as_const(entries))
-        rows.append(RegistryReport::cells(entry));
-    Report::sortRows(rows, RegistryReport::ClassTypeColumn);
-    return cli.emitReport(RegistryReport::build(rows));
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
+        QVector<RegistryInfo> entries;
+        if (const int result = device.GetRegistry(entries, nullptr, nullptr))
+            return cli.gatewayFailure(QStringLiteral("reading the registry"), result, &device);
+        QVector<QStringList> rows;
+        rows.reserve(entries.size());
+        for (const RegistryInfo& entry : std::as_const(entries))
+            rows.append(RegistryReport::cells(entry));
+        Report::sortRows(rows, RegistryReport::ClassTypeColumn);
+        return cli.emitReport(RegistryReport::build(rows));
+    });
 }
 
 // The level file that name stands for: a file of the Levels folder called so (as the level
@@ -132,18 +122,17 @@ int level(Cli& cli, const QStringList& arguments)
     const QString path = levelFile(cli, arguments.at(1), &status);
     if (path.isEmpty())
         return status;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    QList<IdRecord> entries;
-    QString error;
-    if (!LevelReport::check(path, device->cache.classes, &entries, &error))
-        return cli.fail(ExitGatewayError, QStringLiteral("cannot read the level %1: %2").arg(path, error));
-    status = cli.emitReport(FamilyReport::levelReport(FamilyReport::group(entries, LevelReport::cells)));
-    if (status != ExitSuccess)
-        return status;
-    const bool met = std::all_of(entries.cbegin(), entries.cend(), [](const IdRecord& entry) { return entry.available; });
-    return met ? ExitSuccess : ExitFinding;
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
+        QList<IdRecord> entries;
+        QString error;
+        if (!LevelReport::check(path, device.cache.classes, &entries, &error))
+            return cli.fail(ExitGatewayError, QStringLiteral("cannot read the level %1: %2").arg(path, error));
+        const int written = cli.emitReport(FamilyReport::levelReport(FamilyReport::group(entries, LevelReport::cells)));
+        if (written != ExitSuccess)
+            return written;
+        const bool met = std::all_of(entries.cbegin(), entries.cend(), [](const IdRecord& entry) { return entry.available; });
+        return met ? ExitSuccess : ExitFinding;
+    });
 }
 
 } // namespace

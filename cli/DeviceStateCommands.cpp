@@ -10,47 +10,41 @@ namespace {
 
 int settings(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    // Depth first from the root, each node before its children, children in device order.
-    QVector<_SettingsInfo> nodes;
-    QStringList pending {QStringLiteral("/")};
-    while (!pending.isEmpty()) {
-        auto node = QSharedPointer<_SettingsInfo>::create();
-        node->SetPath(pending.takeLast());
-        if (const int result = device->GetChildSettings(node))
-            return cli.gatewayFailure(QStringLiteral("reading the settings at %1").arg(node->Path()), result, device.get());
-        for (auto child = node->children.crbegin(); child != node->children.crend(); ++child)
-            pending.append((*child)->Path());
-        nodes.append(*node);
-    }
-    return cli.emitReport(SettingsReport::build(nodes));
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
+        // Depth first from the root, each node before its children, children in device order.
+        QVector<_SettingsInfo> nodes;
+        QStringList pending {QStringLiteral("/")};
+        while (!pending.isEmpty()) {
+            auto node = QSharedPointer<_SettingsInfo>::create();
+            node->SetPath(pending.takeLast());
+            if (const int result = device.GetChildSettings(node))
+                return cli.gatewayFailure(QStringLiteral("reading the settings at %1").arg(node->Path()), result, &device);
+            for (auto child = node->children.crbegin(); child != node->children.crend(); ++child)
+                pending.append((*child)->Path());
+            nodes.append(*node);
+        }
+        return cli.emitReport(SettingsReport::build(nodes));
+    });
 }
 
 int processes(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    QVector<ProcessInfo> found;
-    if (const int result = device->GetProcesses(found))
-        return cli.gatewayFailure(QStringLiteral("reading the processes"), result, device.get());
-    return cli.emitReport(ProcessReport::build(found));
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
+        QVector<ProcessInfo> found;
+        if (const int result = device.GetProcesses(found))
+            return cli.gatewayFailure(QStringLiteral("reading the processes"), result, &device);
+        return cli.emitReport(ProcessReport::build(found));
+    });
 }
 
 int loadedModules(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    QVector<LoadedModuleInfo> found;
-    if (const int result = device->GetLoadedModules(found))
-        return cli.gatewayFailure(QStringLiteral("reading the loaded modules"), result, device.get());
-    return cli.emitReport(LoadedModuleReport::build(found));
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
+        QVector<LoadedModuleInfo> found;
+        if (const int result = device.GetLoadedModules(found))
+            return cli.gatewayFailure(QStringLiteral("reading the loaded modules"), result, &device);
+        return cli.emitReport(LoadedModuleReport::build(found));
+    });
 }
 
 } // namespace

@@ -14,96 +14,84 @@ namespace {
 
 int list(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    QSharedPointer<_DirectoryInfo> level;
-    if (const int result = device->GetFileSystemLevel(arguments.at(1), level, nullptr, nullptr))
-        return cli.gatewayFailure(QStringLiteral("listing %1").arg(arguments.at(1)), result, device.get());
-    return cli.emitReport(FolderReport::build(*level));
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
+        QSharedPointer<_DirectoryInfo> level;
+        if (const int result = device.GetFileSystemLevel(arguments.at(1), level, nullptr, nullptr))
+            return cli.gatewayFailure(QStringLiteral("listing %1").arg(arguments.at(1)), result, &device);
+        return cli.emitReport(FolderReport::build(*level));
+    });
 }
 
 int pull(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    const QString source = arguments.at(1);
-    QString target = arguments.at(2);
-    if (QFileInfo(target).isDir())
-        target = QDir(target).filePath(source.mid(source.lastIndexOf(QLatin1Char('/')) + 1));
-    const int result = device->CopyFileToPC(source, target, &Cli::progress, &cli);
-    cli.endProgress();
-    if (result)
-        return cli.gatewayFailure(QStringLiteral("copying %1 from the device").arg(source), result, device.get());
-    return ExitSuccess;
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
+        const QString source = arguments.at(1);
+        QString target = arguments.at(2);
+        if (QFileInfo(target).isDir())
+            target = QDir(target).filePath(source.mid(source.lastIndexOf(QLatin1Char('/')) + 1));
+        const int result = device.CopyFileToPC(source, target, &Cli::progress, &cli);
+        cli.endProgress();
+        if (result)
+            return cli.gatewayFailure(QStringLiteral("copying %1 from the device").arg(source), result, &device);
+        return ExitSuccess;
+    });
 }
 
 int push(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    const QString source = arguments.at(1);
-    QString target = arguments.at(2);
-    if (target.endsWith(QLatin1Char('/')))
-        target += QFileInfo(source).fileName();
-    const int result = device->CopyFileToDevice(source, target, &Cli::progress, &cli);
-    cli.endProgress();
-    if (result)
-        return cli.gatewayFailure(QStringLiteral("copying %1 to the device").arg(source), result, device.get());
-    return ExitSuccess;
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
+        const QString source = arguments.at(1);
+        QString target = arguments.at(2);
+        if (target.endsWith(QLatin1Char('/')))
+            target += QFileInfo(source).fileName();
+        const int result = device.CopyFileToDevice(source, target, &Cli::progress, &cli);
+        cli.endProgress();
+        if (result)
+            return cli.gatewayFailure(QStringLiteral("copying %1 to the device").arg(source), result, &device);
+        return ExitSuccess;
+    });
 }
 
 int install(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    QSet<VolumeInfo> found;
-    if (const int result = device->GetVolumes(found))
-        return cli.gatewayFailure(QStringLiteral("reading the volumes"), result, device.get());
-    // By default the volume mounted highest, the one the file system page starts with.
-    QList<VolumeInfo> volumes(found.cbegin(), found.cend());
-    std::sort(volumes.begin(), volumes.end(), [](const VolumeInfo& a, const VolumeInfo& b) { return a.mountPoint < b.mountPoint; });
-    const QString wanted = cli.volume();
-    const auto chosen = std::find_if(volumes.cbegin(), volumes.cend(), [&wanted](const VolumeInfo& volume) {
-        return wanted.isEmpty() || volume.mountPoint == wanted || QString::number(volume.volumeId) == wanted;
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
+        QSet<VolumeInfo> found;
+        if (const int result = device.GetVolumes(found))
+            return cli.gatewayFailure(QStringLiteral("reading the volumes"), result, &device);
+        // By default the first volume by mount point, the one the file system page starts with.
+        QList<VolumeInfo> volumes(found.cbegin(), found.cend());
+        std::sort(volumes.begin(), volumes.end(), [](const VolumeInfo& a, const VolumeInfo& b) { return a.mountPoint < b.mountPoint; });
+        const QString wanted = cli.volume();
+        const auto chosen = std::find_if(volumes.cbegin(), volumes.cend(), [&wanted](const VolumeInfo& volume) {
+            return wanted.isEmpty() || volume.mountPoint == wanted || QString::number(volume.volumeId) == wanted;
+        });
+        if (chosen == volumes.cend())
+            return cli.fail(ExitUsage, wanted.isEmpty() ? QStringLiteral("the device has no volume")
+                                                        : QStringLiteral("the device has no volume %1").arg(wanted));
+        const int result = device.InstallPackage(arguments.at(1), quint16(chosen->volumeId));
+        if (result)
+            return cli.gatewayFailure(QStringLiteral("installing %1").arg(arguments.at(1)), result, &device);
+        std::fputs(qPrintable(device.statusText + QLatin1Char('\n')), stdout);
+        return ExitSuccess;
     });
-    if (chosen == volumes.cend())
-        return cli.fail(ExitUsage, wanted.isEmpty() ? QStringLiteral("the device has no volume")
-                                                    : QStringLiteral("the device has no volume %1").arg(wanted));
-    const int result = device->InstallPackage(arguments.at(1), quint16(chosen->volumeId));
-    if (result)
-        return cli.gatewayFailure(QStringLiteral("installing %1").arg(arguments.at(1)), result, device.get());
-    std::fputs(qPrintable(device->statusText + QLatin1Char('\n')), stdout);
-    return ExitSuccess;
 }
 
 int run(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    if (const int result = device->RunApplication(arguments.at(1)))
-        return cli.gatewayFailure(QStringLiteral("running %1").arg(arguments.at(1)), result, device.get());
-    return ExitSuccess;
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
+        if (const int result = device.RunApplication(arguments.at(1)))
+            return cli.gatewayFailure(QStringLiteral("running %1").arg(arguments.at(1)), result, &device);
+        return ExitSuccess;
+    });
 }
 
 int remove(Cli& cli, const QStringList& arguments)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(arguments.at(0), &status);
-    if (!device)
-        return status;
-    if (const int result = device->DeleteDeviceFile(arguments.at(1)))
-        return cli.gatewayFailure(QStringLiteral("deleting %1").arg(arguments.at(1)), result, device.get());
-    return ExitSuccess;
+    return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
+        if (const int result = device.DeleteDeviceFile(arguments.at(1)))
+            return cli.gatewayFailure(QStringLiteral("deleting %1").arg(arguments.at(1)), result, &device);
+        return ExitSuccess;
+    });
 }
 
 } // namespace

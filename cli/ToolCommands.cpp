@@ -27,36 +27,34 @@ int mifOfFile(Cli& cli, const QString& path)
 
 int mifOfModule(Cli& cli, const QString& deviceName, const QString& module)
 {
-    int status = ExitSuccess;
-    const QSharedPointer<_ZantDevice> device = cli.connect(deviceName, &status);
-    if (!device)
-        return status;
-    QVector<ModuleInfo> modules;
-    if (const int result = device->GetModules(modules, nullptr, nullptr))
-        return cli.gatewayFailure(QStringLiteral("reading the modules"), result, device.get());
-    QStringList paths;
-    for (const ModuleInfo& known : std::as_const(modules)) {
-        if (known.path == module) {
-            paths = QStringList(known.path);
-            break;
+    return cli.onDevice(deviceName, [&](_ZantDevice& device) {
+        QVector<ModuleInfo> modules;
+        if (const int result = device.GetModules(modules, nullptr, nullptr))
+            return cli.gatewayFailure(QStringLiteral("reading the modules"), result, &device);
+        QStringList paths;
+        for (const ModuleInfo& known : std::as_const(modules)) {
+            if (known.path == module) {
+                paths = QStringList(known.path);
+                break;
+            }
+            if (known.name == module)
+                paths.append(known.path);
         }
-        if (known.name == module)
-            paths.append(known.path);
-    }
-    if (paths.isEmpty()) {
-        return cli.fail(ExitGatewayError,
-            QStringLiteral("%1 has no module \"%2\" (\"delvix-cli modules %1\" lists them)")
-                .arg(deviceName, module));
-    }
-    if (paths.size() > 1) {
-        return cli.fail(ExitUsage,
-            QStringLiteral("several modules are named \"%1\"; give one's path: %2")
-                .arg(module, paths.join(QStringLiteral(", "))));
-    }
-    MifEntry entry;
-    if (const int result = device->GetModuleMif(paths.first(), entry))
-        return cli.gatewayFailure(QStringLiteral("reading %1").arg(paths.first()), result, device.get());
-    return cli.emitReport(MifEntryReport::build(entry));
+        if (paths.isEmpty()) {
+            return cli.fail(ExitGatewayError,
+                QStringLiteral("%1 has no module \"%2\" (\"delvix-cli modules %1\" lists them)")
+                    .arg(deviceName, module));
+        }
+        if (paths.size() > 1) {
+            return cli.fail(ExitUsage,
+                QStringLiteral("several modules are named \"%1\"; give one's path: %2")
+                    .arg(module, paths.join(QStringLiteral(", "))));
+        }
+        MifEntry entry;
+        if (const int result = device.GetModuleMif(paths.first(), entry))
+            return cli.gatewayFailure(QStringLiteral("reading %1").arg(paths.first()), result, &device);
+        return cli.emitReport(MifEntryReport::build(entry));
+    });
 }
 
 int mif(Cli& cli, const QStringList& arguments)
