@@ -1,13 +1,9 @@
 #include "ClassReport.h"
 
-namespace {
-
-QString orUnknown(const QString& text)
+QString ClassReport::orUnknown(const QString& text)
 {
     return text.isEmpty() ? QStringLiteral("unknown") : text;
 }
-
-} // namespace
 
 QStringList ClassReport::cells(const IdRecord& record)
 {

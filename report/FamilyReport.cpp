@@ -1,13 +1,10 @@
 #include "FamilyReport.h"
 
+#include "ClassReport.h"
+
 #include <algorithm>
 
 namespace {
-
-QString orUnknown(const QString& text)
-{
-    return text.isEmpty() ? QStringLiteral("unknown") : text;
-}
 
 void addFamilies(ReportNode& parent, const FamilyReport::Families& families, const QStringList& classAttributes)
 {
@@ -33,9 +30,9 @@ QVector<IdRecord> FamilyReport::availableClasses(const IdRecordMap& classes)
         if (!known.available)
             continue;
         IdRecord record = known;
-        record.name = orUnknown(record.name);
-        record.family = orUnknown(record.family);
-        record.subFamily = orUnknown(record.subFamily);
+        record.name = ClassReport::orUnknown(record.name);
+        record.family = ClassReport::orUnknown(record.family);
+        record.subFamily = ClassReport::orUnknown(record.subFamily);
         shown.append(record);
     }
     return shown;
