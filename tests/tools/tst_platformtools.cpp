@@ -202,11 +202,6 @@ private slots:
                    "One|0x00000001|F|S|x|x", fixed + "first|3.2.1",
                    "4 classes in both, 0 only in first, 0 only in 3.2.1"}
             << "";
-        QTest::newRow("classes container")
-            << a << scanFile("", "classes", {"0x7E000001=Alpha"})
-            << QStringList {"Alpha|0x7E000001|F|S|x|x", "Heap|0x01011001|F|S|x|", fixed + "first|second",
-                   "1 class in both, 1 only in first, 0 only in second"}
-            << "";
         QTest::newRow("no class list") << a << scanFile("", "other", {"0x7E000001=Alpha"}) << QStringList()
                                        << "File Format Error|SECOND is not the right format.";
         QTest::newRow("not XML") << a << QByteArray("<ZTOINFO><ZTOVERSION") << QStringList() << "";
