@@ -112,7 +112,6 @@ private slots:
         QTest::addColumn<int>("cancelAt"); // the file whose step cancels; 0: none
         QTest::newRow("whole platform") << 0;
         QTest::newRow("cancelled at the fourth file") << 4;
-        QTest::newRow("cancelled at the first file") << 1;
     }
     void populate()
     {
