@@ -1,20 +1,37 @@
 #include "DeviceWindow.h"
+#include "LockStatusWidget.h"
 #include "ModuleListView.h"
 #include "Portlex.h"
 #include "SaveXmlReport.h"
+#include "SecuritySettingsDialog.h"
 #include "SimulatorProcess.h"
 #include "StubPage.h"
+#include "TestImage.h"
 #include "TestSupport.h"
 
 #include <QLabel>
 #include <QLineEdit>
+#include <QLocale>
 #include <QPointer>
 #include <QSettings>
 #include <QTemporaryDir>
 #include <QTest>
 #include <QTimer>
 #include <QVBoxLayout>
-#include <unistd.h>
+
+namespace {
+
+const QString Led = QStringLiteral(":/LockStatusWidget/Resources/%1.png");
+
+// An expiry text as the C library's ctime writes it: the day of month padded with a blank.
+QString ctimeText(const QDate& date)
+{
+    return QLocale::c().toString(date, QStringLiteral("ddd MMM "))
+        + QString::number(date.day()).rightJustified(2, ' ') + QStringLiteral(" 20:00:00 ")
+        + QString::number(date.year());
+}
+
+} // namespace
 
 // A page the test drives by hand, to see what the window does with a page's signals.
 class FakePage : public StubPage
@@ -125,10 +142,15 @@ private slots:
         QCOMPARE(settings.value("Zantro USB Device: Kestrel K7/size").toSize(), QSize(880, 690));
     }
 
+    // Only the first two windows ever opened show the hint cursors: the module page's and the
+    // enablement indicator's.
     void hintCursorOnTheFirstTwoWindows()
     {
-        for (int number = 1; number <= 3; ++number)
-            QCOMPARE(openWindow("aurora")->_modulePage->testAttribute(Qt::WA_SetCursor), number <= 2);
+        for (int number = 1; number <= 3; ++number) {
+            DeviceWindow* window = openWindow("aurora");
+            QCOMPARE(window->_modulePage->testAttribute(Qt::WA_SetCursor), number <= 2);
+            QCOMPARE(window->findChild<LockStatusWidget*>()->cursor().shape(), number <= 2 ? Qt::BitmapCursor : Qt::ArrowCursor);
+        }
     }
 
     void switchingAttachesAndDetaches()
@@ -216,6 +238,84 @@ private slots:
         window->SetTimedStatus("third");
         addSlot(window).second->trigger();
         QVERIFY(!timer->isActive());
+    }
+
+    // What the indicator and the dialog show in each mode, the dialog opened by a click on
+    // the indicator; "Lock" ends the mode it names (the service first), and the indicator
+    // shows the outcome once the dialog is closed.
+    void enablementThroughTheWindow_data()
+    {
+        QTest::addColumn<QString>("mode");
+        QTest::addColumn<QString>("expiry");
+        QTest::addColumn<QStringList>("indicator"); // text, LED, tool tip
+        QTest::addColumn<QStringList>("panel"); // mode, expiry, privilege values...
+        QTest::addColumn<QString>("afterLock");
+        const QString soon = ctimeText(QDate::currentDate().addDays(30));
+        const QString service = QStringLiteral("Developer Enabled Service"),
+                      sig = QStringLiteral("Developer Enabled Signature");
+        const QStringList priviledges = {"0x00000011", "0x12345678"};
+        // The service's LED is green while 7 or more days are left; a day of month padded with a
+        // blank (the 5th) reads too.
+        const QDate today = QDate::currentDate(), later = today.addDays(40);
+        const QList<std::tuple<const char*, QDate, QString>> services
+            = {{"service 7 days", today.addDays(7), "GreenLED"},
+                {"service 6 days", today.addDays(6), "YellowLED"},
+                {"service padded day", QDate(later.year(), later.month(), 5), "GreenLED"}};
+        for (const auto& [tag, date, led] : services) {
+            const QString expiry = ctimeText(date);
+            QTest::newRow(tag) << "service" << expiry
+                               << QStringList {"DES Enabled", led, service + " expires:\n" + expiry}
+                               << QStringList {service, expiry} + priviledges << "Simulator Enabled";
+        }
+        QTest::newRow("signature") << "signature" << soon
+                                   << QStringList {"Sig Enabled", "Globe", sig + " expires:\n" + soon}
+                                   << QStringList {sig, soon} << "Simulator Enabled";
+        QTest::newRow("both") << "both" << soon
+                              << QStringList {"Sig Enabled", "Globe", sig + " expires:\n" + soon}
+                              << QStringList {sig, soon} << "Sig Enabled";
+        QTest::newRow("none") << "none" << soon << QStringList {"Simulator Enabled", "UnlitLED", ""}
+                              << QStringList {"Disabled???", ""} << "Simulator Enabled";
+    }
+    void enablementThroughTheWindow()
+    {
+        QFETCH(QString, mode);
+        QFETCH(QString, expiry);
+        QFETCH(QStringList, indicator);
+        QFETCH(QStringList, panel);
+        QFETCH(QString, afterLock);
+        TestImage image;
+        image.fillDefault();
+        QByteArray profile = TestImage::defaultProfile();
+        profile.replace(R"(mode="service")", "mode=\"" + mode.toUtf8() + '"');
+        profile.replace("Sun Sep 19 20:00:00 2027", expiry.toUtf8());
+        image.writeProfile(profile);
+        SimulatorProcess simulator(m_sockets.path());
+        const QString id = QString(QStringLiteral("lock-") + QTest::currentDataTag()).replace(' ', '-');
+        QVERIFY(simulator.connectDevice(image.path(), id));
+
+        DeviceWindow window;
+        window.setDevice(id);
+        window.show();
+        auto* status = window.findChild<LockStatusWidget*>();
+        QCOMPARE(status->_modeStatus->text(), indicator.at(0));
+        QCOMPARE(status->_ledStatus->pixmap().toImage(),
+            QImage(Led.arg(indicator.at(1)))
+                .convertToFormat(status->_ledStatus->pixmap().toImage().format()));
+        QCOMPARE(status->toolTip(), indicator.at(2));
+
+        QStringList shown;
+        QTimer::singleShot(0, this, [&] {
+            auto* dialog = window.findChild<SecuritySettingsDialog*>();
+            const SecuritySettings* settings = dialog->_securitySettings;
+            shown << settings->_unlockModeLabel->text() << settings->_expiresLabel->text();
+            for (int row = 0; row < settings->_priviledgeTable->rowCount(); ++row)
+                shown << settings->_priviledgeTable->item(row, 0)->text();
+            settings->_lockButton->click();
+            dialog->okButton->click();
+        });
+        QTest::mouseClick(status->_modeStatus, Qt::LeftButton);
+        QCOMPARE(shown, panel);
+        QCOMPARE(status->_modeStatus->text(), afterLock);
     }
 
     // The window hands the device record to these pages at once, shown or not.

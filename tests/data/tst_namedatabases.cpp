@@ -1,7 +1,11 @@
+#include "IdFormat.h"
+#include "LevelDefinition.h"
+#include "LevelFiles.h"
 #include "NameDatabases.h"
 #include "TestSupport.h"
 
 #include <QBuffer>
+#include <QCoreApplication>
 #include <QTemporaryDir>
 #include <QTest>
 
@@ -15,8 +19,27 @@ QStringList classNames(const NameDatabases& db, const QString& idText)
     return {name, family, subFamily};
 }
 
+IdRecord idAndName(const QString& id, const QString& name)
+{
+    IdRecord r;
+    r.id = id;
+    r.name = name;
+    return r;
+}
+
+bool loadText(LevelDefinition& level, const QByteArray& text)
+{
+    QBuffer buffer;
+    buffer.setData(text);
+    return buffer.open(QIODevice::ReadOnly) && level.load(&buffer);
+}
+
+const QByteArray TwoClasses = R"(<level><Id value="0x00000001" name="One"/><Id value="0x00000002" name="Two"/></level>)";
+
 } // namespace
 
+// The name databases, the id texts they are keyed by (parsed, formatted and normalized), and
+// the level definitions checked against them.
 class TestNameDatabases : public QObject
 {
     Q_OBJECT
@@ -155,6 +178,146 @@ private slots:
         once.initialize(m_dir.path());
         QCOMPARE(classNames(once, "0x00000002").first(), QString("Added"));
         QCOMPARE(classNames(once, "0x00000001").first(), QString("not found"));
+    }
+
+    void formatsIds()
+    {
+        QCOMPARE(formatId(0), "0x00000000");
+        QCOMPARE(formatId(0xABCu), "0x00000ABC");
+        QCOMPARE(formatShortId(0xABC), "0x0ABC");
+        QCOMPARE(formatShortId(0xFFFF), "0xFFFF");
+        for (const quint32 number : {0u, 0xABCu, 0xFFFFFFFFu})
+            QCOMPARE(parseHexId(formatId(number)), number);
+    }
+
+    void parsesHexIds_data()
+    {
+        QTest::addColumn<QString>("text");
+        QTest::addColumn<quint32>("number");
+        QTest::newRow("blanks, upper X, lower digits") << " \t0Xabc" << 0xABCu;
+        QTest::newRow("no prefix, mixed case") << "aBcDeF" << 0xABCDEFu;
+        QTest::newRow("prefix characters in any mix") << "x0X0x 7" << 0x7u;
+        QTest::newRow("stops at letter beyond F") << "0x12G4" << 0x12u;
+        QTest::newRow("stops at blank after digits") << "0x1 2" << 0x1u;
+        QTest::newRow("starts with other character") << "-1" << 0u;
+        QTest::newRow("prefix only") << "0x" << 0u;
+        QTest::newRow("wraps past 32 bits") << "0x123456789" << 0x23456789u;
+        QTest::newRow("non-ASCII digits are not hex") << QString::fromUtf8("\u0661\u0662") << 0u;
+        QTest::newRow("fullwidth letters are not hex") << QString::fromUtf8("0x1\uFF21") << 0x1u;
+    }
+    void parsesHexIds()
+    {
+        QFETCH(QString, text);
+        QFETCH(quint32, number);
+        QCOMPARE(parseHexId(text), number);
+    }
+
+    // Only a-f and X change: no trim, no pad.
+    void normalizesIdText()
+    {
+        const QPair<QString, QString> texts[] = {{"0Xabcdef01", "0xABCDEF01"}, {"XxX0ghz", "xxx0ghz"}, {" 0xab ", " 0xAB "},
+                                                 {QString::fromUtf8("0x\u00E4b"), QString::fromUtf8("0x\u00E4B")}};
+        for (const auto& [text, normalized] : texts)
+            QCOMPARE(normalizeIdText(text), normalized);
+    }
+
+    void listsFilesContainingXml()
+    {
+        QTemporaryDir dir;
+        const QStringList listed{"Level-1.0.xml", "Level-2.0.xml.bak", "a.xmlx", ".hidden.xml"};
+        for (const QString& name : listed + QStringList{"LEVEL-3.0.XML", "Level.Xml", "notes.txt", "xml"})
+            QVERIFY(TestSupport::writeFile(dir.filePath(name), TwoClasses));
+        QVERIFY(QDir(dir.path()).mkdir("folder.xml"));
+        QStringList list{"left over"}, expected;
+        listLevelFiles(dir.path(), list);
+        for (const QString& name : listed)
+            expected << dir.path() + QDir::separator() + name;
+        list.sort();
+        expected.sort();
+        QCOMPARE(list, expected);
+        list = QStringList{"left over"};
+        listLevelFiles(dir.filePath("Levels"), list);
+        QVERIFY(list.isEmpty());
+    }
+
+    // A failed load leaves the records as they were; a load appends.
+    void failedLoadKeepsRecords()
+    {
+        QTemporaryDir dir;
+        QVERIFY(TestSupport::writeFile(dir.filePath("good.xml"), TwoClasses));
+        QVERIFY(TestSupport::writeFile(dir.filePath("unclosed.xml"), R"(<level><Id value="0x3" name="Three"/>)"));
+        QVERIFY(QDir(dir.path()).mkdir("folder.xml"));
+        LevelDefinition level;
+        QVERIFY(level.load(dir.filePath("good.xml")));
+        const QList<IdRecord> once = level.records();
+        QCOMPARE(once.size(), 2);
+        for (const char* name : {"missing.xml", "unclosed.xml", "folder.xml"}) {
+            QVERIFY(!level.load(dir.filePath(name)));
+            QCOMPARE(level.records(), once);
+        }
+        QVERIFY(level.load(dir.filePath("good.xml")));
+        QCOMPARE(level.records(), once + once);
+    }
+
+    void readsIdChildrenInOrder()
+    {
+        LevelDefinition level;
+        QVERIFY(loadText(level, R"(<whatever version="9">
+ <Id value="0x00000002" name="Second"/> <Id value="0x00000001" name="First"/>
+ <Id value="0x00000002" name="SecondAgain"/> <Id value="" name="EmptyValue"/> <Id name="NoValue"/>
+ <Id value="0X0000abcd" name="Normalized"/> <Id value="0x00000005"/>
+ <id value="0x00000006" name="LowerCaseElement"/> <Class value="0x00000007" name="OtherElement"/>
+ <group><Id value="0x00000008" name="Nested"/></group> <Id value="not an id" name="Kept"/>
+</whatever>)"));
+        const QList<IdRecord> expected{
+            idAndName("0x00000002", "Second"),    idAndName("0x00000001", "First"),
+            idAndName("0x00000002", "SecondAgain"), idAndName("0x0000ABCD", "Normalized"),
+            idAndName("0x00000005", ""),          idAndName("not An iD", "Kept"),
+        };
+        QCOMPARE(level.records(), expected);
+    }
+
+    // The map gives the other fields only when it names the class; the file's name stays.
+    void mergesWithIdMap()
+    {
+        IdRecordMap device;
+        device.insert("0x00000001", IdRecord{"0x00000001", "DeviceName", "Kernel", "Memory", "heap.mod", "/usermod/heap", true});
+        device.insert("0x0000ABCD", IdRecord{"0x0000ABCD", "Mixed", "Media", "Audio", "", "", false});
+        device.insert("0x00000002", IdRecord{"0x00000002", "", "Ignored", "Ignored", "x.mod", "/x", true});
+
+        LevelDefinition level;
+        level.setIdMap(&device);
+        QVERIFY(loadText(level, R"(<level><Id value="0x00000001" name="FileName"/>
+ <Id value="0x0000abcd" name="FromLowerCase"/> <Id value="0x00000002" name="MapNameEmpty"/>
+ <Id value="0x00000003" name="Absent"/></level>)"));
+        const QList<IdRecord> expected{
+            IdRecord{"0x00000001", "FileName", "Kernel", "Memory", "heap.mod", "/usermod/heap", true},
+            IdRecord{"0x0000ABCD", "FromLowerCase", "Media", "Audio", "", "", false},
+            idAndName("0x00000002", "MapNameEmpty"),
+            idAndName("0x00000003", "Absent"),
+        };
+        QCOMPARE(level.records(), expected);
+    }
+
+    // Reference-data drift: the shipped levels and the class database must agree.
+    void shippedLevelsNameKnownClasses()
+    {
+        NameDatabases names;
+        names.load(QCoreApplication::applicationDirPath());
+        QStringList files;
+        listLevelFiles(files);
+        const QString levels = QCoreApplication::applicationDirPath() + "/Levels/";
+        QVERIFY(files.contains(levels + "Level-1.0.xml") && files.contains(levels + "Level-2.0.xml"));
+        for (const QString& path : files) {
+            LevelDefinition level;
+            QVERIFY2(level.load(path), qPrintable(path));
+            QVERIFY(level.records().size() >= 50);
+            for (const IdRecord& r : level.records()) {
+                QString name, family, subFamily;
+                names.lookupClass(r.id, name, family, subFamily);
+                QCOMPARE(name, r.name);
+            }
+        }
     }
 };
 

@@ -71,20 +71,6 @@ inline QStringList columnTexts(const QTableWidget* table, int column)
     return texts;
 }
 
-// True when report is the text of expected/<name>; otherwise it is left as actual-<name> in the
-// temporary folder, for a look.
-inline bool isExpectedExport(const QString& report, const QString& name)
-{
-    QFile expected(QFINDTESTDATA("expected/" + name));
-    if (expected.open(QIODevice::ReadOnly) && report == QString::fromUtf8(expected.readAll()))
-        return true;
-    QFile actual(QDir::temp().filePath("actual-" + name));
-    if (actual.open(QIODevice::WriteOnly))
-        actual.write(report.toUtf8());
-    qWarning("the export differs from expected/%s; it is in %s", qPrintable(name), qPrintable(actual.fileName()));
-    return false;
-}
-
 // The first argument of every emission a QSignalSpy recorded, as text.
 inline QStringList signalTexts(const QList<QList<QVariant>>& emissions)
 {

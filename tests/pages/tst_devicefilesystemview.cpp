@@ -58,14 +58,6 @@ const QList<QPair<QString, int>> CrawlOrder = {{"/", 7},       {"/usermod", 1}, 
                                                {"/user", 1},   {"/user/photos", 1}, {"/err", 1},
                                                {"/shared", 1}, {"/alpha", 2},   {"/zeta", 1}};
 
-int itemCount(QTreeWidget* tree)
-{
-    int count = 0;
-    for (QTreeWidgetItemIterator it(tree); *it; ++it)
-        ++count;
-    return count;
-}
-
 QTreeWidgetItem* itemAt(QTreeWidget* tree, const QString& path)
 {
     for (QTreeWidgetItemIterator it(tree); *it; ++it) {
@@ -194,7 +186,7 @@ private slots:
         int before = 0;
         QStringList wrong;
         connect(&page.pacer(), &TickPacer::armed, this, [&](int ms) {
-            const int now = itemCount(page._fsTree);
+            const int now = int(treeLines(page._fsTree).size());
             if (ms == 0 && shown < fetched.size()) {
                 const QString path = fetched.at(shown++);
                 const auto level = std::find_if(CrawlOrder.cbegin(), CrawlOrder.cend(), [&](const auto& l) { return l.first == path; });

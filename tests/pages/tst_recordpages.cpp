@@ -1,5 +1,7 @@
+#include "ClassListView.h"
 #include "FamilyTreeView.h"
 #include "FormatSize.h"
+#include "IdFormat.h"
 #include "LevelViewWidget.h"
 #include "PageFixtures.h"
 #include "PhoneInfoWidget.h"
@@ -28,9 +30,20 @@ void choose(LevelViewWidget& page, const QString& path)
     page._levelDocuments->setCurrentIndex(page._levelDocuments->count() - 1);
 }
 
+enum Column { NameColumn, IdColumn, FamilyColumn, SubFamilyColumn, AvailableColumn, PathColumn };
+
+DeviceCache numberedClasses(int count)
+{
+    QList<IdRecord> classes;
+    for (int k = 0; k < count; ++k)
+        classes.append(makeClass(formatId(0x7E000001 + quint32(k)), QString("Class %1").arg(k), "F", "S"));
+    return cacheOf(classes);
+}
+
 } // namespace
 
-// The pages filled from the device's record alone: the family tree (grouping of the available
+// The pages filled from the device's record alone: the class id list (progress, clicks, the
+// export, a record that comes late or goes), the family tree (grouping of the available
 // classes, the order of the families while the tree fills, the export), the level page (its
 // choice of level files, the check of a definition against the classes, its failures and
 // export) and the phone information (every label and box from its key, the format tables,
@@ -54,6 +67,111 @@ private slots:
 )"));
     }
 
+    // Each page counts its own rows: a second page says the same as the first.
+    void reportsProgressEveryHundredRows_data()
+    {
+        QTest::addColumn<int>("classes");
+        QTest::addColumn<QStringList>("statuses");
+        QTest::newRow("none") << 0 << QStringList{"Processing Class IDs", "Ready"};
+        QTest::newRow("201") << 201 << QStringList{"Processing Class IDs", "Processed 100 classes", "Processed 200 classes", "Ready"};
+    }
+
+    void reportsProgressEveryHundredRows()
+    {
+        QFETCH(int, classes);
+        QFETCH(QStringList, statuses);
+        DeviceCache cache = numberedClasses(classes);
+        for (int page = 0; page < 2; ++page) {
+            ClassListView view;
+            QSignalSpy spy(&view, &GatewayComponentWidget::statusChanged);
+            view.setDeviceRecord(&cache);
+            QVERIFY(fillByHand(view));
+            QCOMPARE(signalTexts(spy), statuses);
+            QCOMPARE(view._classIDTable->rowCount(), classes);
+            QVERIFY(view._classIDTable->updatesEnabled() && !view._classIDTable->signalsBlocked());
+            QCOMPARE(view.state(), GatewayComponentWidget::Complete);
+        }
+    }
+
+    void clicksEmitTheCellText()
+    {
+        DeviceCache cache = cacheOf({makeClass("0x00000001", "First", "F", "S"), makeClass("0x00000002", "Second", "F", "S")});
+        ClassListView page;
+        page.resize(800, 400);
+        page.show();
+        page.setDeviceRecord(&cache);
+        QVERIFY(fillByHand(page));
+        QVERIFY(QTest::qWaitForWindowExposed(&page));
+        QTableWidget* table = page._classIDTable;
+        QSignalSpy singles(&page, &ClassListView::singleClick);
+        QSignalSpy doubles(&page, &ClassListView::doubleClick);
+        QTest::mouseClick(table->viewport(), Qt::LeftButton, {}, table->visualItemRect(table->item(1, IdColumn)).center());
+        const QPoint first = table->visualItemRect(table->item(0, NameColumn)).center();
+        QTest::mouseClick(table->viewport(), Qt::LeftButton, {}, first);
+        QTest::mouseDClick(table->viewport(), Qt::LeftButton, {}, first);
+        QCOMPARE(signalTexts(singles), QStringList({"0x00000002", "First"}));
+        QCOMPARE(signalTexts(doubles), QStringList("First"));
+    }
+
+    // Rows and export: "unknown" for empty names, the path, the table's order, escaping.
+    void exportFollowsTheSortAndIsFrozen()
+    {
+        DeviceCache cache = cacheOf({makeClass("0x00000002", "Beta", "F", "", true, "/usermod/b/b.mif"),
+                                     makeClass("0x00000001", "alpha <1>", "F & G", "S", true, "zkernel"),
+                                     makeClass("0x00000003", "", "", "", false)});
+        cache.deviceData.zantVersion = "3.2.9";
+        cache.deviceData.hardware.insert("Model", "\"Slim\"");
+        ClassListView page;
+        page.setDeviceRecord(&cache);
+        QVERIFY(fillByHand(page));
+        page._classIDTable->sortByColumn(IdColumn, Qt::DescendingOrder);
+        QCOMPARE(columnTexts(page._classIDTable, AvailableColumn), QStringList({"No", "Yes", "Yes"}));
+        const QString report = page.xmlReport();
+        QCOMPARE(report, QString("<!DOCTYPE zant-class-ids>\n"
+                                 "<ZTOINFO>\n"
+                                 " <ZTOVERSION version=\"3.2.9\" target=\"0x0A110021\" manufacturer=\"Zantro &amp; Sons\" "
+                                 "model=\"&quot;Slim&quot;\"/>\n <ZantHeaderDataList>\n"
+                                 "  <ZTOId path=\"\" subfamily=\"unknown\" family=\"unknown\" value=\"0x00000003\" name=\"unknown\"/>\n"
+                                 "  <ZTOId path=\"/usermod/b/b.mif\" subfamily=\"unknown\" family=\"F\" value=\"0x00000002\" name=\"Beta\"/>\n"
+                                 "  <ZTOId path=\"zkernel\" subfamily=\"S\" family=\"F &amp; G\" value=\"0x00000001\" "
+                                 "name=\"alpha &lt;1&gt;\"/>\n </ZantHeaderDataList>\n</ZTOINFO>\n"));
+        page._classIDTable->sortByColumn(NameColumn, Qt::AscendingOrder);
+        QCOMPARE(page.xmlReport(), report);
+    }
+
+    // Without a record the page waits and its export keeps its shape, frozen even when a record
+    // comes later; that record, and the device with it, may go while the worker walks it.
+    void recordComesLateAndGoesEarly()
+    {
+        ClassListView page;
+        page.setDeviceRecord(nullptr);
+        page.onTimeElapse();
+        QCOMPARE(page.status(), QString("Starting"));
+        const QString expected("<!DOCTYPE zant-class-ids>\n<ZTOINFO>\n"
+                               " <ZTOVERSION version=\"\" target=\"\" manufacturer=\"\" model=\"\"/>\n"
+                               " <ZantHeaderDataList/>\n</ZTOINFO>\n");
+        QCOMPARE(page.xmlReport(), expected);
+        auto cache = std::make_unique<DeviceCache>(numberedClasses(400));
+        page.setDeviceRecord(cache.get());
+        QVERIFY(tickUntil(page, [&] { return page._classIDTable->rowCount() > 0; }));
+        cache.reset();
+        QVERIFY(fillByHand(page));
+        QCOMPARE(page._classIDTable->rowCount(), 400);
+        QCOMPARE(page.xmlReport(), expected);
+    }
+
+    void destroyedWhileFillingEndsItsWorker()
+    {
+        // Far more than teardown waits for: only a worker that stops ends in time.
+        DeviceCache cache = numberedClasses(20000);
+        const int threads = TestSupport::threadCount();
+        auto page = std::make_unique<ClassListView>();
+        page->setDeviceRecord(&cache);
+        QVERIFY(tickUntil(*page, [&] { return page->_classIDTable->rowCount() > 0; }));
+        QVERIFY(TestSupport::threadCount() > threads);
+        page.reset();
+        QTRY_COMPARE(TestSupport::threadCount(), threads);
+    }
     // Families sorted without regard to case and named as first met; sub-families keep
     // their case; the rest in the order the classes came (ascending ids).
     void groupsByFamilyAndSubFamily()

@@ -200,12 +200,20 @@ private slots:
 
     // The same module given as an entry or read from a MIF file on disk (asked of the device:
     // moduleListDoubleClickOpensTheModule), replacing every row of an entry shown before.
+    // "Save Module Info..." offers the file's module name with ".xml" and writes the export unchanged.
     void showsTheModule()
     {
+        QTemporaryDir folder;
+        QString caption;
+        saveXmlReportDialogs().askFileName = [&](QWidget*, const QString& asked, const QString&, const QString&) {
+            caption = asked;
+            return folder.filePath("saved.xml");
+        };
         MifEntry before;
         before.classes = {Stranger, OtherStranger};
         for (const bool fromFile : {false, true}) {
             ModuleInfoDialog dialog;
+            dialog.show();
             QVERIFY(dialog._moduleInfoView->setMifEntry(before));
             if (fromFile)
                 dialog.openMifFile(m_files.filePath("odd.mif"), "odd");
@@ -213,8 +221,12 @@ private slots:
                 QVERIFY(dialog._moduleInfoView->setMifEntry(oddModule()));
             QCOMPARE(dialog.windowTitle(), fromFile ? QString("Module Info odd") : QString("Module Info"));
             QCOMPARE(viewLines(dialog._moduleInfoView), OddModuleLines);
-            QCOMPARE(dialog._moduleInfoView->mifEntryXml(), OddModuleXml);
+            dialog._saveModInfoButton->click();
+            QCOMPARE(TestSupport::readFile(folder.filePath("saved.xml")), OddModuleXml.toLocal8Bit());
+            QVERIFY(dialog.isVisible());
         }
+        saveXmlReportDialogs().askFileName = nullptr;
+        QCOMPARE(caption, QString("Save fileodd.xml"));
     }
 
     // Nothing to show leaves the view empty, without a message; the title still names the
@@ -252,50 +264,17 @@ private slots:
         QCOMPARE(viewLines(dialog._moduleInfoView), QStringList());
     }
 
-    // "Save Module Info..." offers the module's name with ".xml" and writes the export unchanged.
-    void savesTheExport()
+    // A closed dialog leaves its place to the next one, unless that is off every screen.
+    void placementOffEveryScreen()
     {
-        QTemporaryDir folder;
-        QString caption;
-        saveXmlReportDialogs().askFileName = [&](QWidget*, const QString& asked, const QString&, const QString&) {
-            caption = asked;
-            return folder.filePath("saved.xml");
-        };
+        QPointer<ModuleInfoDialog> first = new ModuleInfoDialog;
+        first->show();
+        first->move(9000, 9000);
+        first->resize(520, 310);
+        first->close();
+        QTRY_VERIFY(first.isNull());
         ModuleInfoDialog dialog;
-        dialog.show();
-        dialog.openMifFile(m_files.filePath("odd.mif"), "odd");
-        dialog._saveModInfoButton->click();
-        saveXmlReportDialogs().askFileName = nullptr;
-        QCOMPARE(caption, QString("Save fileodd.xml"));
-        QCOMPARE(TestSupport::readFile(folder.filePath("saved.xml")), OddModuleXml.toLocal8Bit());
-        QVERIFY(dialog.isVisible());
-    }
-
-    // The first dialog opens at its default place; however one is closed, it goes and leaves its
-    // place to the next one, 20 pixels right and down, unless that is off every screen.
-    void placement_data()
-    {
-        QTest::addColumn<QString>("close");
-        QTest::addColumn<QPoint>("closedAt");
-        QTest::addColumn<QRect>("next");
-        QTest::newRow("first ever") << "" << QPoint() << QRect(120, 120, 600, 350);
-        QTest::newRow("off every screen") << "window" << QPoint(9000, 9000) << QRect(40, 40, 520, 310);
-    }
-    void placement()
-    {
-        QFETCH(QString, close);
-        QFETCH(QPoint, closedAt);
-        QFETCH(QRect, next);
-        if (!close.isEmpty()) {
-            QPointer<ModuleInfoDialog> first = new ModuleInfoDialog;
-            first->show();
-            first->move(closedAt);
-            first->resize(520, 310);
-            first->close();
-            QTRY_VERIFY(first.isNull());
-        }
-        ModuleInfoDialog dialog;
-        QCOMPARE(QRect(dialog.pos(), dialog.size()), next);
+        QCOMPARE(QRect(dialog.pos(), dialog.size()), QRect(40, 40, 520, 310));
     }
 
     // A double-click in the device window's module list opens the module's own information.
