@@ -218,7 +218,7 @@ QStringList readNodes(const QTreeWidget* tree)
 // themselves, an empty one and a failing one. Module list, registry and settings tree: a small
 // module image, images registering MIME types, a settings store, and devices failing their
 // queries.
-class TestLivePages : public QObject
+class TestQueryPages : public QObject
 {
     Q_OBJECT
 
@@ -653,5 +653,5 @@ private:
     QSharedPointer<_ZantDevice> m_modules;
 };
 
-QTEST_MAIN(TestLivePages)
-#include "tst_livepages.moc"
+QTEST_MAIN(TestQueryPages)
+#include "tst_querypages.moc"

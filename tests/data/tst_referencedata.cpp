@@ -40,7 +40,7 @@ const QByteArray TwoClasses = R"(<level><Id value="0x00000001" name="One"/><Id v
 
 // The name databases, the id texts they are keyed by (parsed, formatted and normalized), and
 // the level definitions checked against them.
-class TestNameDatabases : public QObject
+class TestReferenceData : public QObject
 {
     Q_OBJECT
 
@@ -321,5 +321,5 @@ private slots:
     }
 };
 
-QTEST_GUILESS_MAIN(TestNameDatabases)
-#include "tst_namedatabases.moc"
+QTEST_GUILESS_MAIN(TestReferenceData)
+#include "tst_referencedata.moc"

@@ -32,7 +32,7 @@ static QString absoluteTarget() { return QDir::tempPath() + QStringLiteral("/del
 // with a canary beside the image that nothing may read or change; and package extraction
 // on its own: what may be unpacked, where, and how much, and the sweep of what cut
 // transfers leave.
-class TestVolumePathResolver : public QObject
+class TestDevicePaths : public QObject
 {
     Q_OBJECT
 
@@ -279,5 +279,5 @@ private slots:
     }
 };
 
-QTEST_GUILESS_MAIN(TestVolumePathResolver)
-#include "tst_volumepathresolver.moc"
+QTEST_GUILESS_MAIN(TestDevicePaths)
+#include "tst_devicepaths.moc"

@@ -281,7 +281,7 @@ QSharedPointer<_SettingsInfo> settingsChain(int depth)
 
 // The transport: FrameServer against DeviceConnection, raw sockets and hand-written devices;
 // and the wire format under it: framing in any chunks, and every record's encoding.
-class FrameServerTest : public QObject
+class TestProtocol : public QObject
 {
     Q_OBJECT
 
@@ -757,5 +757,5 @@ private slots:
     }
 };
 
-QTEST_GUILESS_MAIN(FrameServerTest)
-#include "tst_frameserver.moc"
+QTEST_GUILESS_MAIN(TestProtocol)
+#include "tst_protocol.moc"

@@ -159,7 +159,7 @@ QString marked(QTreeWidget& tree)
 // worker and the teardown of workers; and what every page shares: the search duty, and the
 // order of the table and tree items (item type first, for a tree only in its first column,
 // then the text without regard to letter case, ids and numbers as text).
-class TestPageWorker : public QObject
+class TestPageFramework : public QObject
 {
     Q_OBJECT
 
@@ -461,5 +461,5 @@ private slots:
     }
 };
 
-QTEST_MAIN(TestPageWorker)
-#include "tst_pageworker.moc"
+QTEST_MAIN(TestPageFramework)
+#include "tst_pageframework.moc"
