@@ -173,22 +173,10 @@ int main(int argc, char** argv)
     const int classes = options.value(QStringLiteral("classes")).toInt();
     const int runs = std::max(1, options.value(QStringLiteral("runs")).toInt());
 
-    const QString image = work.filePath(QStringLiteral("image"));
-    const QString sockets = work.filePath(QStringLiteral("sockets"));
-    if (!work.isValid() || !generateImage(image, modules, classes)) {
-        std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulatorPath()));
-        return 1;
-    }
     QProcess server;
-    startSimulator(server, image, sockets);
-    // Connecting here also waits until the simulator has loaded the image: the tool's runs
-    // then time only their own work.
-    const QSharedPointer<_ZantDevice> device = connectDevice();
-    if (!device) {
-        std::fprintf(stderr, "the simulator did not answer: %s\n",
-            qPrintable(QString::fromLocal8Bit(server.readAll())));
+    const QSharedPointer<_ZantDevice> device = serveGeneratedDevice(server, work, modules, classes);
+    if (!device)
         return 1;
-    }
     out() << QStringLiteral("image: %1 modules, %2 classes\n").arg(modules).arg(device->cache.classes.size());
 
     const QString outputPath = work.filePath(QStringLiteral("output"));

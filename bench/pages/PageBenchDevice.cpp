@@ -11,6 +11,8 @@
 
 #include <sys/resource.h>
 
+#include <cstdio>
+
 namespace PageBenchDevice {
 
 void useOffscreenAndWorkSettings(const QTemporaryDir& work)
@@ -56,6 +58,20 @@ QSharedPointer<_ZantDevice> connectDevice(const QString& id)
         QThread::msleep(100);
     }
     return nullptr;
+}
+
+QSharedPointer<_ZantDevice> serveGeneratedDevice(QProcess& server, const QTemporaryDir& work, int modules, int classes)
+{
+    const QString image = work.filePath(QStringLiteral("image"));
+    if (!work.isValid() || !generateImage(image, modules, classes)) {
+        std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulatorPath()));
+        return {};
+    }
+    startSimulator(server, image, work.filePath(QStringLiteral("sockets")));
+    const QSharedPointer<_ZantDevice> device = connectDevice();
+    if (!device)
+        std::fprintf(stderr, "the simulator did not answer: %s\n", qPrintable(QString::fromLocal8Bit(server.readAll())));
+    return device;
 }
 
 long peakMemoryMb()

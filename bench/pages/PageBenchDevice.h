@@ -22,6 +22,9 @@ void startSimulator(QProcess& server, const QString& image, const QString& socke
 bool generateImage(const QString& image, int modules, int classes);
 // Waits (up to two minutes, while a large image loads) for the simulator and connects it.
 QSharedPointer<_ZantDevice> connectDevice(const QString& id = DeviceId);
+// Generates an image of that size in work, serves and connects it (the image loaded); null
+// after saying why on stderr.
+QSharedPointer<_ZantDevice> serveGeneratedDevice(QProcess& server, const QTemporaryDir& work, int modules, int classes);
 long peakMemoryMb();
 
 } // namespace PageBenchDevice

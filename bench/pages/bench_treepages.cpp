@@ -186,19 +186,10 @@ int main(int argc, char** argv)
     const int classes = options.value(QStringLiteral("classes")).toInt();
 
     QTemporaryDir work;
-    const QString image = work.filePath(QStringLiteral("image"));
-    const QString sockets = work.filePath(QStringLiteral("sockets"));
-    if (!work.isValid() || !generateImage(image, modules, classes)) {
-        std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulatorPath()));
-        return 1;
-    }
     QProcess server;
-    startSimulator(server, image, sockets);
-    const QSharedPointer<_ZantDevice> device = connectDevice();
-    if (!device) {
-        std::fprintf(stderr, "the simulator did not answer: %s\n", qPrintable(QString::fromLocal8Bit(server.readAll())));
+    const QSharedPointer<_ZantDevice> device = serveGeneratedDevice(server, work, modules, classes);
+    if (!device)
         return 1;
-    }
     const int known = int(device->cache.classes.size());
     out() << QStringLiteral("image: %1 modules, %2 classes; peak memory before the pages: %3 MB\n")
                  .arg(modules).arg(known).arg(peakMemoryMb());
