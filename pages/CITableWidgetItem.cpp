@@ -1,17 +1,19 @@
 #include "CITableWidgetItem.h"
 
+#include "SortKey.h"
+
 namespace {
 
-QString sortKey(const QTableWidgetItem& item)
+QString keyOf(const QTableWidgetItem& item)
 {
-    return item.data(Qt::DisplayRole).toString().toCaseFolded();
+    return sortKey(item.data(Qt::DisplayRole).toString());
 }
 
 } // namespace
 
 CITableWidgetItem::CITableWidgetItem(const QString& text, int type)
     : QTableWidgetItem(text, type)
-    , m_sortKey(text.toCaseFolded())
+    , m_sortKey(sortKey(text))
 {
 }
 
@@ -19,7 +21,7 @@ void CITableWidgetItem::setData(int role, const QVariant& value)
 {
     QTableWidgetItem::setData(role, value);
     if (role == Qt::DisplayRole || role == Qt::EditRole)
-        m_sortKey = sortKey(*this);
+        m_sortKey = keyOf(*this);
 }
 
 bool CITableWidgetItem::operator<(const QTableWidgetItem& other) const
@@ -28,5 +30,5 @@ bool CITableWidgetItem::operator<(const QTableWidgetItem& other) const
         return type() < other.type();
     if (const auto* ci = dynamic_cast<const CITableWidgetItem*>(&other))
         return m_sortKey < ci->m_sortKey;
-    return m_sortKey < sortKey(other);
+    return m_sortKey < keyOf(other);
 }

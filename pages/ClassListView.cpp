@@ -1,15 +1,14 @@
 #include "ClassListView.h"
 
-#include "CITableWidgetItem.h"
 #include "ClassListViewThread.h"
 #include "ClassReport.h"
 #include "DeviceCache.h"
+#include "RecordTableModel.h"
 
 #include <QHeaderView>
 
 namespace {
 
-constexpr int RowHeight = 20;
 // Rows measured when the columns are fitted to their contents: all of a short list, a
 // bounded sample of a long one, where measuring a thousand rows stalls the window.
 constexpr int ResizeSampleRows = 100;
@@ -22,9 +21,13 @@ ClassListView::ClassListView(QWidget* parent)
     setStatus(QStringLiteral("Starting"));
     setState(Starting);
     setupUi(this);
+    m_model = new RecordTableModel({QStringLiteral("Class Name"), QStringLiteral("Class ID"), QStringLiteral("Family"),
+                                    QStringLiteral("Sub-family"), QStringLiteral("Available"), QStringLiteral("Path")},
+                                   this);
+    _classIDTable->setModel(m_model);
     _classIDTable->horizontalHeader()->setResizeContentsPrecision(ResizeSampleRows);
-    connect(_classIDTable, &QTableWidget::itemClicked, this, &ClassListView::onTableClick);
-    connect(_classIDTable, &QTableWidget::itemDoubleClicked, this, &ClassListView::onTableDoubleClick);
+    connect(_classIDTable, &QTableView::clicked, this, &ClassListView::onTableClick);
+    connect(_classIDTable, &QTableView::doubleClicked, this, &ClassListView::onTableDoubleClick);
     connect(&m_pacer, &TickPacer::timeout, this, &ClassListView::onTimeElapse);
     m_pacer.armFirst(FirstTickMs);
 }
@@ -42,6 +45,11 @@ const TickPacer& ClassListView::pacer() const
     return m_pacer;
 }
 
+RecordTableModel* ClassListView::model() const
+{
+    return m_model;
+}
+
 QString ClassListView::componentName()
 {
     return QStringLiteral("ClassList");
@@ -53,7 +61,7 @@ void ClassListView::startComponent(const QString&)
 
 bool ClassListView::canSearch()
 {
-    return state() == Complete;
+    return isComplete();
 }
 
 bool ClassListView::search(const QString& text)
@@ -71,59 +79,19 @@ void ClassListView::lowerPriority()
     m_worker.setPriority(QThread::LowestPriority);
 }
 
-bool ClassListView::isComplete()
-{
-    return statusIsReady();
-}
-
 void ClassListView::onTimeElapse()
 {
-    switch (m_pending->drain([this](const IdRecord& record) { appendRow(record); })) {
-    case FeedStep::Waiting:
-        m_pacer.armIdle();
-        break;
-    case FeedStep::Drained:
+    QVector<QStringList> rows;
+    const FeedStep step = m_pending->drain([&rows](const IdRecord& record) { rows.append(ClassReport::cells(record)); });
+    m_model->appendRows(rows);
+    if (!rows.isEmpty())
+        setStatus(QStringLiteral("Processed %1 classes").arg(m_model->rowCount()));
+    if (!m_pacer.pace(step, 0))
         finish();
-        break;
-    case FeedStep::Shown:
-        if (m_pending->isClosed()) {
-            // The worker is done: the rest goes in without repainting.
-            setTableQuiet(true);
-            m_pacer.armBusy(1);
-        } else {
-            m_pacer.armBusy(0);
-        }
-        break;
-    }
-}
-
-void ClassListView::appendRow(const IdRecord& record)
-{
-    const int row = _classIDTable->rowCount();
-    _classIDTable->setRowCount(row + 1);
-    const QStringList cells = ClassReport::cells(record);
-    for (int column = 0; column < cells.size(); ++column)
-        _classIDTable->setItem(row, column, new CITableWidgetItem(cells.at(column)));
-    _classIDTable->setRowHeight(row, RowHeight);
-
-    ++m_processed;
-    if (m_processed % ProgressStep == 0) {
-        setTableQuiet(false);
-        setStatus(QStringLiteral("Processed %1 classes").arg(m_processed));
-    }
-}
-
-void ClassListView::setTableQuiet(bool quiet)
-{
-    if (_classIDTable->updatesEnabled() == !quiet)
-        return;
-    _classIDTable->blockSignals(quiet);
-    _classIDTable->setUpdatesEnabled(!quiet);
 }
 
 void ClassListView::finish()
 {
-    setTableQuiet(false);
     // Enabling sorting sorts by the indicator; sortByColumn afterwards would sort again.
     _classIDTable->horizontalHeader()->setSortIndicator(ClassReport::NameColumn, Qt::AscendingOrder);
     _classIDTable->setSortingEnabled(true);
@@ -132,22 +100,22 @@ void ClassListView::finish()
     setState(Complete);
 }
 
-void ClassListView::onTableClick(QTableWidgetItem* item)
+void ClassListView::onTableClick(const QModelIndex& index)
 {
-    if (item)
-        emit singleClick(item->text());
+    if (index.isValid())
+        emit singleClick(index.data().toString());
 }
 
-void ClassListView::onTableDoubleClick(QTableWidgetItem* item)
+void ClassListView::onTableDoubleClick(const QModelIndex& index)
 {
-    if (item)
-        emit doubleClick(item->text());
+    if (index.isValid())
+        emit doubleClick(index.data().toString());
 }
 
 QString ClassListView::xmlReport()
 {
     // Without a record the document keeps its shape, with empty device texts.
     if (m_report.isEmpty())
-        m_report = ClassReport::build(tableRows(_classIDTable), m_record ? m_record->deviceData : DeviceData()).toXml();
+        m_report = ClassReport::build(m_model->rows(), m_record ? m_record->deviceData : DeviceData()).toXml();
     return m_report;
 }

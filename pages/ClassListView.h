@@ -10,11 +10,11 @@
 #include <QSharedPointer>
 
 struct DeviceCache;
-class QTableWidgetItem;
+class RecordTableModel;
 
 // The class id list page: every class the device's record knows, with its names, whether it
-// is available and where it comes from. A worker queues the record's classes; the tick
-// moves them into the table and reports its progress every hundred rows.
+// is available and where it comes from. A worker queues the record's classes; each tick
+// moves a time slice of them into the table and tells how many rows it shows.
 class ClassListView : public GatewayComponentWidget, public Ui::ClassListViewClass
 {
     Q_OBJECT
@@ -23,8 +23,6 @@ public:
     static constexpr int FirstTickMs = 500;
     static constexpr int IdleStartMs = 1;
     static constexpr int IdleCapMs = 500;
-    // The status tells the count of shown rows at every multiple of this.
-    static constexpr int ProgressStep = 100;
 
     explicit ClassListView(QWidget* parent = nullptr);
 
@@ -33,6 +31,7 @@ public:
     void setDeviceRecord(DeviceCache* record);
 
     const TickPacer& pacer() const;
+    RecordTableModel* model() const;
 
 public slots:
     QString componentName() override;
@@ -41,11 +40,10 @@ public slots:
     bool search(const QString& text) override;
     void raisePriority() override;
     void lowerPriority() override;
-    bool isComplete() override;
     QString xmlReport() override;
 
-    void onTableClick(QTableWidgetItem* item);
-    void onTableDoubleClick(QTableWidgetItem* item);
+    void onTableClick(const QModelIndex& index);
+    void onTableDoubleClick(const QModelIndex& index);
     void onTimeElapse();
 
 signals:
@@ -53,15 +51,12 @@ signals:
     void doubleClick(QString moduleEntry);
 
 private:
-    void appendRow(const IdRecord& record);
-    void setTableQuiet(bool quiet);
     void finish();
 
     DeviceCache* m_record = nullptr;
+    RecordTableModel* m_model;
     QSharedPointer<PageFeed<IdRecord>> m_pending = QSharedPointer<PageFeed<IdRecord>>::create();
     TickPacer m_pacer{IdleStartMs, IdleCapMs};
-    // Rows shown by this page; each page counts from zero.
-    int m_processed = 0;
     QString m_report;
     PageWorker m_worker;
 };

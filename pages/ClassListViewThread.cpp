@@ -10,13 +10,9 @@ ClassListViewThread::ClassListViewThread(GatewayComponentWidget* page, IdRecordM
 void ClassListViewThread::work()
 {
     reportStatus(QStringLiteral("Processing Class IDs"), GatewayComponentWidget::Processing);
-    // Steps are due one StepMs after another, so the sleeps' overruns do not add up.
-    QDeadlineTimer nextStep = QDeadlineTimer::current(Qt::PreciseTimer);
-    for (const IdRecord& record : std::as_const(m_classes)) {
-        m_feed->append(record);
-        nextStep += StepMs;
-        if (!pauseUntil(nextStep))
-            return;
-    }
+    const QVector<IdRecord> records(m_classes.cbegin(), m_classes.cend());
+    if (isStopRequested())
+        return;
+    m_feed->append(records);
     m_feed->close();
 }

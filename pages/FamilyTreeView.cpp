@@ -81,11 +81,6 @@ void FamilyTreeView::lowerPriority()
     m_worker.setPriority(QThread::LowPriority);
 }
 
-bool FamilyTreeView::isComplete()
-{
-    return statusIsReady();
-}
-
 void FamilyTreeView::onTimeElapse()
 {
     const FeedStep step = m_pending->step([this](const IdRecord& record) { insertClass(record); });

@@ -7,7 +7,7 @@
 #include <QItemSelectionModel>
 #include <QMutexLocker>
 #include <QSet>
-#include <QTableWidget>
+#include <QTableView>
 #include <QTreeWidget>
 #include <QVector>
 
@@ -86,12 +86,7 @@ void GatewayComponentWidget::setStatus(const QString& status)
 
 bool GatewayComponentWidget::isComplete()
 {
-    return false;
-}
-
-bool GatewayComponentWidget::statusIsReady() const
-{
-    return status() == readyStatus();
+    return state() == Complete;
 }
 
 QString GatewayComponentWidget::errorStatus(int result)
@@ -127,7 +122,7 @@ void GatewayComponentWidget::deselectTableHits()
     m_tableHits.clear();
 }
 
-void GatewayComponentWidget::searchTable(const QString& text, QTableWidget* table)
+void GatewayComponentWidget::searchTable(const QString& text, QTableView* table)
 {
     WaitCursor wait;
     if (m_tableTarget) {
@@ -139,31 +134,25 @@ void GatewayComponentWidget::searchTable(const QString& text, QTableWidget* tabl
 
     m_searchText = text;
     m_tableTarget = table;
-    if (!table)
+    if (!table || !table->model())
         return;
 
-    // Updates stay off while rows are hidden and shown: with them on, every row costs a
-    // relayout of the table.
+    // The model's texts are searched, not the view; the view then hides and shows rows with
+    // updates off, since with them on every row costs a relayout of the table.
+    const QVector<QPair<int, int>> cells = matchingCells(table->model(), text);
+    const int rows = table->model()->rowCount();
     table->setUpdatesEnabled(false);
-    for (int row = 0; row < table->rowCount(); ++row) {
-        if (!table->isRowHidden(row))
-            table->hideRow(row);
+    QVector<bool> hit(rows, false);
+    for (const auto& cell : cells)
+        hit[cell.first] = true;
+    for (int row = 0; row < rows; ++row) {
+        if (table->isRowHidden(row) == hit.at(row))
+            table->setRowHidden(row, !hit.at(row));
     }
-
-    const QList<QTableWidgetItem*> hits = table->findItems(text, Qt::MatchContains | Qt::MatchWrap);
-    if (hits.isEmpty()) {
+    if (cells.isEmpty()) {
         table->setUpdatesEnabled(true);
         reportNotFound();
         return;
-    }
-
-    QVector<QPair<int, int>> cells;
-    cells.reserve(hits.size());
-    for (QTableWidgetItem* hit : hits) {
-        const int row = hit->row();
-        if (table->isRowHidden(row))
-            table->showRow(row);
-        cells.append({row, hit->column()});
     }
     m_tableHits = compactCellSelection(table->model(), cells);
     table->selectionModel()->select(m_tableHits, QItemSelectionModel::Select);
@@ -177,10 +166,11 @@ void GatewayComponentWidget::clearTableSearch()
         return;
 
     WaitCursor wait;
-    QTableWidget* table = m_tableTarget;
+    QTableView* table = m_tableTarget;
     table->setUpdatesEnabled(false);
     deselectTableHits();
-    for (int row = 0; row < table->rowCount(); ++row) {
+    const int rows = table->model() ? table->model()->rowCount() : 0;
+    for (int row = 0; row < rows; ++row) {
         if (table->isRowHidden(row))
             table->showRow(row);
     }
@@ -237,7 +227,7 @@ bool GatewayComponentWidget::itemMatches(const QString& text, QTreeWidgetItem* i
     return false;
 }
 
-bool GatewayComponentWidget::applyTableSearch(const QString& text, QTableWidget* table)
+bool GatewayComponentWidget::applyTableSearch(const QString& text, QTableView* table)
 {
     if (text.length() >= MinimumSearchLength)
         searchTable(text, table);
@@ -254,20 +244,4 @@ bool GatewayComponentWidget::applyTreeSearch(const QString& text, QTreeWidget* t
     }
     searchTree(text, tree);
     return true;
-}
-
-QVector<QStringList> GatewayComponentWidget::tableRows(const QTableWidget* table)
-{
-    QVector<QStringList> rows;
-    rows.reserve(table->rowCount());
-    for (int row = 0; row < table->rowCount(); ++row) {
-        QStringList cells;
-        cells.reserve(table->columnCount());
-        for (int column = 0; column < table->columnCount(); ++column) {
-            const QTableWidgetItem* item = table->item(row, column);
-            cells.append(item ? item->text() : QString());
-        }
-        rows.append(cells);
-    }
-    return rows;
 }

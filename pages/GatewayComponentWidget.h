@@ -6,7 +6,7 @@
 #include <QString>
 #include <QWidget>
 
-class QTableWidget;
+class QTableView;
 class QTreeWidget;
 class QTreeWidgetItem;
 
@@ -42,7 +42,7 @@ public:
     void setState(ComponentState state);
     void setStatus(const QString& status);
 
-    void searchTable(const QString& text, QTableWidget* table);
+    void searchTable(const QString& text, QTableView* table);
     void clearTableSearch();
     void searchTree(const QString& text, QTreeWidget* tree);
     void clearTreeSearch();
@@ -59,6 +59,7 @@ public slots:
     virtual bool search(const QString& text) = 0;
     virtual void raisePriority() = 0;
     virtual void lowerPriority() = 0;
+    // Every fetched record is shown: the state is Complete, whatever the status reads.
     virtual bool isComplete();
     virtual QString xmlReport() = 0;
 
@@ -68,15 +69,11 @@ signals:
     void stateChanged(GatewayComponentWidget::ComponentState state);
 
 protected:
-    bool statusIsReady() const;
-
     // The search entry of a table page: from three characters on searches the table,
     // below that clears the search. Always true.
-    bool applyTableSearch(const QString& text, QTableWidget* table);
+    bool applyTableSearch(const QString& text, QTableView* table);
     // The same for a tree page; true when it searched, false when it cleared.
     bool applyTreeSearch(const QString& text, QTreeWidget* tree);
-    // Every row's cell texts, in the order the table shows them: what an export writes.
-    static QVector<QStringList> tableRows(const QTableWidget* table);
 
 private:
     void reportNotFound();
@@ -84,7 +81,7 @@ private:
 
     ComponentState m_state = Starting;
     QPointer<QTreeWidget> m_treeTarget;
-    QPointer<QTableWidget> m_tableTarget;
+    QPointer<QTableView> m_tableTarget;
     // Cells found by the last table search, as few ranges; their corners are persistent,
     // so rows removed since are not touched.
     QItemSelection m_tableHits;

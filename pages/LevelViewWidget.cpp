@@ -95,11 +95,6 @@ void LevelViewWidget::lowerPriority()
 {
 }
 
-bool LevelViewWidget::isComplete()
-{
-    return statusIsReady();
-}
-
 void LevelViewWidget::onCurrentLevelChanged(int index)
 {
     setStatus(QStringLiteral("Processing"));

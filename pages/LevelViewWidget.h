@@ -29,7 +29,6 @@ public slots:
     bool search(const QString& text) override;
     void raisePriority() override;
     void lowerPriority() override;
-    bool isComplete() override;
     QString xmlReport() override;
 
     void onCurrentLevelChanged(int index);

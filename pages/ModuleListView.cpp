@@ -1,15 +1,14 @@
 #include "ModuleListView.h"
 
-#include "CITableWidgetItem.h"
 #include "ModuleListViewThread.h"
-#include "Portlex.h"
 #include "ModuleReport.h"
+#include "Portlex.h"
+#include "RecordTableModel.h"
 
 #include <QHeaderView>
 
 namespace {
 
-constexpr int RowHeight = 20;
 // Rows the header measures when it fits the columns to their contents: every row of a
 // short list, a bounded sample of a long one, which would otherwise cost every repaint
 // during the fill a measurement of a thousand rows.
@@ -23,10 +22,15 @@ ModuleListView::ModuleListView(QWidget* parent)
     setStatus(QStringLiteral("Starting"));
     setState(Starting);
     setupUi(this);
+    m_model = new RecordTableModel({QStringLiteral("Module Name"), QStringLiteral("Component Services Version"),
+                                    QStringLiteral("Module Type"), QStringLiteral("Signature"), QStringLiteral("Path"),
+                                    QStringLiteral("Copyright")},
+                                   this);
+    _moduleTable->setModel(m_model);
     _moduleTable->horizontalHeader()->setSectionResizeMode(QHeaderView::ResizeToContents);
     _moduleTable->horizontalHeader()->setResizeContentsPrecision(ResizeSampleRows);
-    connect(_moduleTable, &QTableWidget::itemClicked, this, &ModuleListView::onTableClick);
-    connect(_moduleTable, &QTableWidget::itemDoubleClicked, this, &ModuleListView::onTableDoubleClick);
+    connect(_moduleTable, &QTableView::clicked, this, &ModuleListView::onTableClick);
+    connect(_moduleTable, &QTableView::doubleClicked, this, &ModuleListView::onTableDoubleClick);
     connect(&m_pacer, &TickPacer::timeout, this, &ModuleListView::onTimeElapse);
     m_pacer.armFirst(FirstTickMs);
 }
@@ -34,6 +38,11 @@ ModuleListView::ModuleListView(QWidget* parent)
 const TickPacer& ModuleListView::pacer() const
 {
     return m_pacer;
+}
+
+RecordTableModel* ModuleListView::model() const
+{
+    return m_model;
 }
 
 QString ModuleListView::componentName()
@@ -53,7 +62,7 @@ void ModuleListView::startComponent(const QString& deviceId)
 
 bool ModuleListView::canSearch()
 {
-    return statusIsReady();
+    return isComplete();
 }
 
 bool ModuleListView::search(const QString& text)
@@ -71,29 +80,16 @@ void ModuleListView::lowerPriority()
     m_worker.setPriority(QThread::LowestPriority);
 }
 
-bool ModuleListView::isComplete()
-{
-    return statusIsReady();
-}
-
 void ModuleListView::onTimeElapse()
 {
-    const FeedStep step = m_pending->drain([this](const ModuleInfo& module) { appendRow(module); });
+    QVector<QStringList> rows;
+    const FeedStep step = m_pending->drain([this, &rows](const ModuleInfo& module) {
+        m_modules.append(module);
+        rows.append(ModuleReport::cells(module));
+    });
+    m_model->appendRows(rows);
     if (!m_pacer.pace(step, 0))
         finish();
-}
-
-void ModuleListView::appendRow(const ModuleInfo& module)
-{
-    const int row = _moduleTable->rowCount();
-    _moduleTable->setRowCount(row + 1);
-    const QStringList cells = ModuleReport::cells(module);
-    for (int column = 0; column < cells.size(); ++column)
-        _moduleTable->setItem(row, column, new CITableWidgetItem(cells.at(column)));
-    // The numbers behind the type and signature texts, for the module information dialog.
-    _moduleTable->item(row, ModuleReport::TypeColumn)->setData(Qt::UserRole, module.type);
-    _moduleTable->item(row, ModuleReport::SignatureColumn)->setData(Qt::UserRole, module.signature);
-    _moduleTable->setRowHeight(row, RowHeight);
 }
 
 void ModuleListView::finish()
@@ -107,32 +103,32 @@ void ModuleListView::finish()
 
 ModuleInfo ModuleListView::moduleAt(int row) const
 {
-    const auto text = [this, row](int column) { return _moduleTable->item(row, column)->text(); };
+    const ModuleInfo& shown = m_modules.at(m_model->arrivalIndex(row));
     ModuleInfo module;
-    module.name = text(ModuleReport::NameColumn);
-    module.version = text(ModuleReport::VersionColumn);
-    module.type = _moduleTable->item(row, ModuleReport::TypeColumn)->data(Qt::UserRole).toUInt();
-    module.signature = _moduleTable->item(row, ModuleReport::SignatureColumn)->data(Qt::UserRole).toUInt();
-    module.path = text(ModuleReport::PathColumn);
-    module.copyright = text(ModuleReport::CopyrightColumn);
+    module.name = shown.name;
+    module.version = shown.version;
+    module.type = shown.type;
+    module.signature = shown.signature;
+    module.path = shown.path;
+    module.copyright = shown.copyright;
     return module;
 }
 
-void ModuleListView::onTableClick(QTableWidgetItem* item)
+void ModuleListView::onTableClick(const QModelIndex& index)
 {
-    if (item && item->tableWidget())
-        emit singleClick(moduleAt(item->row()));
+    if (index.isValid() && index.model() == m_model)
+        emit singleClick(moduleAt(index.row()));
 }
 
-void ModuleListView::onTableDoubleClick(QTableWidgetItem* item)
+void ModuleListView::onTableDoubleClick(const QModelIndex& index)
 {
-    if (item && item->tableWidget())
-        emit doubleClick(moduleAt(item->row()));
+    if (index.isValid() && index.model() == m_model)
+        emit doubleClick(moduleAt(index.row()));
 }
 
 QString ModuleListView::xmlReport()
 {
     if (m_report.isEmpty())
-        m_report = ModuleReport::build(tableRows(_moduleTable)).toXml();
+        m_report = ModuleReport::build(m_model->rows()).toXml();
     return m_report;
 }

@@ -8,13 +8,14 @@
 #include "ui_ModuleListView.h"
 
 #include <QSharedPointer>
+#include <QVector>
 
-class QTableWidgetItem;
+class RecordTableModel;
 class _ZantDevice;
 
 // The module list page: every module installed on the device, one row each. Its worker asks
-// the device once; the tick then moves the modules into the table a short batch per turn
-// of the event loop, so a long list fills in while the window stays responsive.
+// the device once; each tick then moves a time slice of the modules into the table, so a
+// long list fills in while the window stays responsive.
 class ModuleListView : public GatewayComponentWidget, public Ui::ModuleListViewClass
 {
     Q_OBJECT
@@ -30,6 +31,7 @@ public:
 
     // The tick's timer, so that its pacing can be observed.
     const TickPacer& pacer() const;
+    RecordTableModel* model() const;
 
 public slots:
     QString componentName() override;
@@ -38,11 +40,10 @@ public slots:
     bool search(const QString& text) override;
     void raisePriority() override;
     void lowerPriority() override;
-    bool isComplete() override;
     QString xmlReport() override;
 
-    void onTableClick(QTableWidgetItem* item);
-    void onTableDoubleClick(QTableWidgetItem* item);
+    void onTableClick(const QModelIndex& index);
+    void onTableDoubleClick(const QModelIndex& index);
     void onTimeElapse();
 
 signals:
@@ -50,12 +51,14 @@ signals:
     void doubleClick(ModuleInfo info);
 
 private:
-    void appendRow(const ModuleInfo& module);
     void finish();
     // The module a row shows; the fields the table does not show stay at their defaults.
     ModuleInfo moduleAt(int row) const;
 
     QSharedPointer<_ZantDevice> m_device;
+    RecordTableModel* m_model;
+    // The modules shown, in the order they arrived (the model's arrival index).
+    QVector<ModuleInfo> m_modules;
     QSharedPointer<PageFeed<ModuleInfo>> m_pending = QSharedPointer<PageFeed<ModuleInfo>>::create();
     TickPacer m_pacer{IdleStartMs, IdleCapMs};
     QString m_report;

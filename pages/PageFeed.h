@@ -12,18 +12,18 @@
 enum class FeedStep
 {
     Waiting, // nothing pending and more may come: back off
-    Shown,   // one record was shown: come back soon
+    Shown,   // records were shown: come back soon
     Drained  // everything delivered has been shown and nothing more will come
 };
 
 // How long one tick may go on showing records before it lets the event loop paint and
-// handle input again.
-constexpr int TickBudgetMs = 10;
+// handle input again: half a frame, leaving the other half to the view's layout and paint.
+constexpr int TickBudgetMs = 8;
 
 // Records passed from a page's worker thread to its GUI thread. The worker appends and
-// finally closes the feed; the GUI thread takes one record per tick. Every access takes
-// the feed's mutex, and only for the single operation, so neither side ever waits for the
-// other's device call or row filling. Page and worker share it through a QSharedPointer,
+// finally closes the feed; the GUI thread takes one record (step) or a time slice (drain)
+// per tick. Every access takes the feed's mutex, and only for the single operation, so
+// neither side ever waits for the other's device call or row filling. Page and worker share it through a QSharedPointer,
 // so a worker that outlives its page still writes into live memory.
 template <typename Record>
 class PageFeed
@@ -102,23 +102,27 @@ public:
         return drained ? FeedStep::Drained : FeedStep::Shown;
     }
 
-    // A tick that shows pending records for up to budgetMs, at least one when there is one:
-    // a long list then costs one turn of the event loop, and one repaint, per batch instead
-    // of per record. A tick that has shown something says so even when the queue ran dry,
-    // so that the tick comes back soon rather than backing off.
+    // One time slice of a tick: shows pending records until budgetMs is spent, at least one
+    // when there is one, so a long list costs one turn of the event loop, and one repaint,
+    // per slice instead of per record. A slice that has shown something says Shown even
+    // when the queue ran dry or the feed is drained: the tick comes back at once, and the
+    // page's closing work (a sort, "Ready") gets a tick of its own. Use it with
+    // TickPacer::pace(step, 0); a page that adds rows to a model collects them in show and
+    // inserts them after the slice as one batch.
     template <typename Show>
     FeedStep drain(Show&& show, int budgetMs = TickBudgetMs)
     {
         QElapsedTimer spent;
         spent.start();
-        FeedStep result = step(show);
-        while (result == FeedStep::Shown && !spent.hasExpired(budgetMs)) {
-            const FeedStep next = step(show);
-            if (next == FeedStep::Waiting)
-                break;
-            result = next;
-        }
-        return result;
+        bool shown = false;
+        const auto showOne = [&](const Record& record) {
+            shown = true;
+            show(record);
+        };
+        FeedStep result = step(showOne);
+        while (result == FeedStep::Shown && !spent.hasExpired(budgetMs))
+            result = step(showOne);
+        return shown ? FeedStep::Shown : result;
     }
 
 private:

@@ -111,11 +111,6 @@ void PhoneInfoWidget::lowerPriority()
 {
 }
 
-bool PhoneInfoWidget::isComplete()
-{
-    return statusIsReady();
-}
-
 QString PhoneInfoWidget::xmlReport()
 {
     // The facts the page shows, from the record it shows them from; empty before one came.

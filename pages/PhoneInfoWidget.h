@@ -26,7 +26,6 @@ public slots:
     bool search(const QString& text) override;
     void raisePriority() override;
     void lowerPriority() override;
-    bool isComplete() override;
     QString xmlReport() override;
 
 private:

@@ -1,7 +1,7 @@
 #include "RegistryListView.h"
 
-#include "CITableWidgetItem.h"
 #include "Portlex.h"
+#include "RecordTableModel.h"
 #include "RegistryListViewThread.h"
 #include "RegistryReport.h"
 
@@ -9,7 +9,6 @@
 
 namespace {
 
-constexpr int RowHeight = 20;
 // Rows the header measures when it fits the columns to their contents: every row of a
 // short list, a bounded sample of a long one.
 constexpr int ResizeSampleRows = 100;
@@ -21,11 +20,15 @@ RegistryListView::RegistryListView(QWidget* parent)
 {
     setStatus(QStringLiteral("Starting"));
     setupUi(this);
+    m_model = new RecordTableModel(
+        {QStringLiteral("Class Type"), QStringLiteral("Class Handler"), QStringLiteral("Flags"), QStringLiteral("Mime Type")},
+        this);
+    _registryTable->setModel(m_model);
     QHeaderView* header = _registryTable->horizontalHeader();
     header->setSectionResizeMode(QHeaderView::ResizeToContents);
     header->setResizeContentsPrecision(ResizeSampleRows);
-    connect(_registryTable, &QTableWidget::itemClicked, this, &RegistryListView::onTableClick);
-    connect(_registryTable, &QTableWidget::itemDoubleClicked, this, &RegistryListView::onTableDoubleClick);
+    connect(_registryTable, &QTableView::clicked, this, &RegistryListView::onTableClick);
+    connect(_registryTable, &QTableView::doubleClicked, this, &RegistryListView::onTableDoubleClick);
     connect(&m_pacer, &TickPacer::timeout, this, &RegistryListView::onTimeElapse);
     m_pacer.armFirst(FirstTickMs);
 }
@@ -33,6 +36,11 @@ RegistryListView::RegistryListView(QWidget* parent)
 const TickPacer& RegistryListView::pacer() const
 {
     return m_pacer;
+}
+
+RecordTableModel* RegistryListView::model() const
+{
+    return m_model;
 }
 
 QString RegistryListView::componentName()
@@ -52,7 +60,7 @@ void RegistryListView::startComponent(const QString& deviceId)
 
 bool RegistryListView::canSearch()
 {
-    return _registryTable->rowCount() > 0;
+    return m_model->rowCount() > 0;
 }
 
 bool RegistryListView::search(const QString& text)
@@ -70,32 +78,13 @@ void RegistryListView::lowerPriority()
     m_worker.setPriority(QThread::LowestPriority);
 }
 
-bool RegistryListView::isComplete()
-{
-    return statusIsReady();
-}
-
 void RegistryListView::onTimeElapse()
 {
-    const int shownBefore = _registryTable->rowCount();
-    const FeedStep step = m_pending->drain([this](const RegistryInfo& entry) { appendRow(entry); });
-    // The closing sort of a long table gets a tick of its own, not the end of a batch's.
-    if (step == FeedStep::Drained && _registryTable->rowCount() != shownBefore) {
-        m_pacer.armBusy(0);
-        return;
-    }
+    QVector<QStringList> rows;
+    const FeedStep step = m_pending->drain([&rows](const RegistryInfo& entry) { rows.append(RegistryReport::cells(entry)); });
+    m_model->appendRows(rows);
     if (!m_pacer.pace(step, 0))
         finish();
-}
-
-void RegistryListView::appendRow(const RegistryInfo& entry)
-{
-    const int row = _registryTable->rowCount();
-    _registryTable->setRowCount(row + 1);
-    const QStringList cells = RegistryReport::cells(entry);
-    for (int column = 0; column < cells.size(); ++column)
-        _registryTable->setItem(row, column, new CITableWidgetItem(cells.at(column)));
-    _registryTable->setRowHeight(row, RowHeight);
 }
 
 void RegistryListView::finish()
@@ -107,21 +96,21 @@ void RegistryListView::finish()
     setState(Complete);
 }
 
-void RegistryListView::onTableClick(QTableWidgetItem* item)
+void RegistryListView::onTableClick(const QModelIndex& index)
 {
-    if (item)
-        emit singleClick(item->text());
+    if (index.isValid())
+        emit singleClick(index.data().toString());
 }
 
-void RegistryListView::onTableDoubleClick(QTableWidgetItem* item)
+void RegistryListView::onTableDoubleClick(const QModelIndex& index)
 {
-    if (item)
-        emit doubleClick(item->text());
+    if (index.isValid())
+        emit doubleClick(index.data().toString());
 }
 
 QString RegistryListView::xmlReport()
 {
     if (m_report.isEmpty())
-        m_report = RegistryReport::build(tableRows(_registryTable)).toXml();
+        m_report = RegistryReport::build(m_model->rows()).toXml();
     return m_report;
 }

@@ -9,12 +9,12 @@
 
 #include <QSharedPointer>
 
-class QTableWidgetItem;
+class RecordTableModel;
 class _ZantDevice;
 
 // The registry page: one row per registry entry of the device, with the classes that
-// handle its MIME type and its flags. Its worker asks the device once; the tick moves the
-// entries into the table a short batch per turn of the event loop.
+// handle its MIME type and its flags. Its worker asks the device once; each tick moves a
+// time slice of the entries into the table.
 class RegistryListView : public GatewayComponentWidget, public Ui::RegistryListViewClass
 {
     Q_OBJECT
@@ -27,6 +27,7 @@ public:
     explicit RegistryListView(QWidget* parent = nullptr);
 
     const TickPacer& pacer() const;
+    RecordTableModel* model() const;
 
 public slots:
     QString componentName() override;
@@ -35,11 +36,10 @@ public slots:
     bool search(const QString& text) override;
     void raisePriority() override;
     void lowerPriority() override;
-    bool isComplete() override;
     QString xmlReport() override;
 
-    void onTableClick(QTableWidgetItem* item);
-    void onTableDoubleClick(QTableWidgetItem* item);
+    void onTableClick(const QModelIndex& index);
+    void onTableDoubleClick(const QModelIndex& index);
     void onTimeElapse();
 
 signals:
@@ -47,10 +47,10 @@ signals:
     void doubleClick(QString moduleEntry);
 
 private:
-    void appendRow(const RegistryInfo& entry);
     void finish();
 
     QSharedPointer<_ZantDevice> m_device;
+    RecordTableModel* m_model;
     QSharedPointer<PageFeed<RegistryInfo>> m_pending = QSharedPointer<PageFeed<RegistryInfo>>::create();
     TickPacer m_pacer{IdleStartMs, IdleCapMs};
     QString m_report;

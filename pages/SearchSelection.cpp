@@ -19,6 +19,20 @@ int depth(const QTreeWidgetItem* item)
 
 } // namespace
 
+QVector<QPair<int, int>> matchingCells(const QAbstractItemModel* model, const QString& text)
+{
+    QVector<QPair<int, int>> cells;
+    const int rows = model->rowCount();
+    const int columns = model->columnCount();
+    for (int row = 0; row < rows; ++row) {
+        for (int column = 0; column < columns; ++column) {
+            if (model->index(row, column).data().toString().contains(text, Qt::CaseInsensitive))
+                cells.append({row, column});
+        }
+    }
+    return cells;
+}
+
 QItemSelection compactCellSelection(const QAbstractItemModel* model, QVector<QPair<int, int>> cells)
 {
     using Spans = QVector<QPair<int, int>>; // first and last column of each run

@@ -12,6 +12,10 @@ class QTreeWidgetItem;
 // grows with the number of selection ranges times the rows (header highlighting, row
 // lookups), so hits are selected as few rectangles, in one change.
 
+// The (row, column) cells of a table model whose display text contains text, without regard
+// to letter case, row by row.
+QVector<QPair<int, int>> matchingCells(const QAbstractItemModel* model, const QString& text);
+
 // (row, column) cells as runs of adjacent columns within a row, joined over adjacent rows
 // that have the same runs.
 QItemSelection compactCellSelection(const QAbstractItemModel* model, QVector<QPair<int, int>> cells);

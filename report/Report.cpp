@@ -1,5 +1,6 @@
 #include "Report.h"
 
+#include "SortKey.h"
 #include "XmlReport.h"
 
 #include <QJsonArray>
@@ -147,7 +148,7 @@ void Report::sortRows(QVector<QStringList>& rows, int column)
     QVector<QPair<QString, qsizetype>> keys;
     keys.reserve(rows.size());
     for (qsizetype i = 0; i < rows.size(); ++i)
-        keys.append(qMakePair(rows.at(i).value(column).toCaseFolded(), i));
+        keys.append(qMakePair(sortKey(rows.at(i).value(column)), i));
     std::stable_sort(keys.begin(), keys.end(), [](const auto& a, const auto& b) { return a.first < b.first; });
     QVector<QStringList> sorted;
     sorted.reserve(rows.size());

@@ -141,11 +141,11 @@ void waitUntilDone(GatewayComponentWidget* page)
         loop.exec();
 }
 
-void reportPage(const QString& name, GatewayComponentWidget* page, const QTableWidget* table, qint64 readyMs)
+void reportPage(const QString& name, GatewayComponentWidget* page, const QTableView* table, qint64 readyMs)
 {
     out() << QStringLiteral("GUI %1 page: %2 rows, status \"%3\" after %4 ms\n")
                  .arg(name)
-                 .arg(table->rowCount())
+                 .arg(table->model()->rowCount())
                  .arg(page->status())
                  .arg(readyMs);
     out().flush();

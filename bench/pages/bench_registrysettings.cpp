@@ -181,7 +181,7 @@ int main(int argc, char** argv)
             window.action_Registry->trigger();
             return window._registryListView;
         },
-        [](DeviceWindow& window) { return window._registryListView->_registryTable->rowCount(); });
+        [](DeviceWindow& window) { return window._registryListView->_registryTable->model()->rowCount(); });
     out() << QStringLiteral("  %1 rows\n").arg(registry.items);
     reportFill(registry, QStringLiteral("target < 1000 ms"));
 

@@ -44,11 +44,10 @@ public:
 
     void finish() { setStatus("Ready"); setState(Complete); }
     void startComponent(const QString&) override { ++starts; }
-    bool canSearch() override { return status() == "Ready"; }
+    bool canSearch() override { return isComplete(); }
     bool search(const QString& text) override { searches << text; return true; }
     void raisePriority() override { ++raises; }
     void lowerPriority() override { ++lowers; }
-    bool isComplete() override { return statusIsReady(); }
     QString xmlReport() override { return report; }
 };
 
@@ -325,7 +324,7 @@ private slots:
         QTRY_COMPARE_WITH_TIMEOUT(window->_classListView->status(), QString("Ready"), 20000);
         QTRY_COMPARE_WITH_TIMEOUT(window->_familyTreeView->status(), QString("Ready"), 20000);
         QCOMPARE(window->_stackedWidget->currentIndex(), 0);
-        QVERIFY(window->_classListView->_classIDTable->rowCount() > 0);
+        QVERIFY(window->_classListView->_classIDTable->model()->rowCount() > 0);
         QVERIFY(window->_familyTreeView->_familyTree->topLevelItemCount() > 0);
         QVERIFY(window->_levelViewWidget->_levelDocuments->count() > 1);  // the prompt and the level files
     }

@@ -63,6 +63,14 @@ inline QStringList treeLines(const QTreeWidget* tree)
     return lines;
 }
 
+inline QStringList columnTexts(const QAbstractItemModel* model, int column)
+{
+    QStringList texts;
+    for (int row = 0; row < model->rowCount(); ++row)
+        texts.append(model->index(row, column).data().toString());
+    return texts;
+}
+
 inline QStringList columnTexts(const QTableWidget* table, int column)
 {
     QStringList texts;

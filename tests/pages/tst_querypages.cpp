@@ -7,11 +7,13 @@
 #include "PageFixtures.h"
 #include "Portlex.h"
 #include "ProcessView.h"
+#include "RecordTableModel.h"
 #include "RegistryListView.h"
 #include "SimulatorProcess.h"
 #include "TestSupport.h"
 #include "_ZantDevice.h"
 
+#include <QLineEdit>
 #include <QSignalSpy>
 #include <QTemporaryDir>
 
@@ -395,7 +397,7 @@ private slots:
         const QString empty = early.xmlReport();
         QCOMPARE(empty, QString("<!DOCTYPE zant-modules>\n<modules/>\n"));
         QVERIFY(fillByHand(early));
-        QCOMPARE(early._moduleTable->rowCount(), 2);
+        QCOMPARE(early.model()->rowCount(), 2);
         QCOMPARE(early.xmlReport(), empty);
 
         ModuleListView page;
@@ -435,8 +437,9 @@ private slots:
         expected.size = 0;
         expected.moduleId = 0;
 
-        QTableWidget* table = page._moduleTable;
-        const QPoint cell = table->visualItemRect(table->item(columnTexts(table, NameColumn).indexOf("plain"), PathColumn)).center();
+        QTableView* table = page._moduleTable;
+        const int row = int(columnTexts(page.model(), NameColumn).indexOf("plain"));
+        const QPoint cell = table->visualRect(page.model()->index(row, PathColumn)).center();
         QSignalSpy singles(&page, &ModuleListView::singleClick);
         QSignalSpy doubles(&page, &ModuleListView::doubleClick);
         QTest::mouseClick(table->viewport(), Qt::LeftButton, {}, cell);
@@ -444,9 +447,8 @@ private slots:
         QCOMPARE(singles.first().at(0).value<ModuleInfo>(), expected);
         QCOMPARE(doubles.count(), 1);
         QCOMPARE(doubles.at(0).at(0).value<ModuleInfo>(), expected);
-        // A cell outside any table brings nothing.
-        QTableWidgetItem loose("loose");
-        page.onTableDoubleClick(&loose);
+        // An index of no row brings nothing.
+        page.onTableDoubleClick(QModelIndex());
         QCOMPARE(doubles.count(), 1);
     }
 
@@ -466,16 +468,28 @@ private slots:
         page.startComponent("flags");
         QVERIFY(fillByHand(page));
         QCOMPARE(signalTexts(statuses), QStringList({"Querying Registry IDs", "Processing Registry Entries", "Ready"}));
-        QCOMPARE(columnTexts(page._registryTable, ClassTypeColumn), QStringList({"1", "2", "3", "4"}));
-        QCOMPARE(columnTexts(page._registryTable, ClassHandlerColumn), QStringList({"17", "18", "19", "20"}));
-        QCOMPARE(columnTexts(page._registryTable, FlagsColumn), QStringList({"Active | Restricted", "Restricted", "Active", ""}));
-        QCOMPARE(columnTexts(page._registryTable, MimeTypeColumn), QStringList({"text/x-a", "text/x-a", "text/x-b", "TEXT/X-B"}));
+        QCOMPARE(columnTexts(page.model(), ClassTypeColumn), QStringList({"1", "2", "3", "4"}));
+        QCOMPARE(columnTexts(page.model(), ClassHandlerColumn), QStringList({"17", "18", "19", "20"}));
+        QCOMPARE(columnTexts(page.model(), FlagsColumn), QStringList({"Active | Restricted", "Restricted", "Active", ""}));
+        QCOMPARE(columnTexts(page.model(), MimeTypeColumn), QStringList({"text/x-a", "text/x-a", "text/x-b", "TEXT/X-B"}));
         QCOMPARE(page.xmlReport(), QString("<!DOCTYPE registrylist>\n<entries>\n"
                                            " <entry mime-type=\"text/x-a\" flags=\"Active | Restricted\" class-handler=\"17\" class-type=\"1\"/>\n"
                                            " <entry mime-type=\"text/x-a\" flags=\"Restricted\" class-handler=\"18\" class-type=\"2\"/>\n"
                                            " <entry mime-type=\"text/x-b\" flags=\"Active\" class-handler=\"19\" class-type=\"3\"/>\n"
                                            " <entry mime-type=\"TEXT/X-B\" flags=\"\" class-handler=\"20\" class-type=\"4\"/>\n"
                                            "</entries>\n"));
+        // A cell refuses an edit by the keyboard, by a double-click and by the model alike.
+        page.resize(600, 300);
+        page.show();
+        QVERIFY(QTest::qWaitForWindowExposed(&page));
+        QTableView* table = page._registryTable;
+        const QModelIndex cell = page.model()->index(0, MimeTypeColumn);
+        table->setCurrentIndex(cell);
+        QTest::keyClick(table, Qt::Key_F2);
+        QTest::mouseDClick(table->viewport(), Qt::LeftButton, {}, table->visualRect(cell).center());
+        QVERIFY(table->findChildren<QLineEdit*>().isEmpty());
+        QVERIFY(!page.model()->setData(cell, "edited"));
+        QCOMPARE(cell.data().toString(), QString("text/x-a"));
     }
 
     // A failed query leaves its text and an empty table; the tick goes on polling, and the
@@ -501,24 +515,24 @@ private slots:
         QFETCH(GatewayComponentWidget::ComponentState, state);
         SimulatorProcess failing(m_sockets.path());
         QVERIFY(failing.connectDevice(SimulatorProcess::sampleImage("simulator"), "failing-query", {"--fail", rule}));
-        const auto check = [&](auto& page, const QTableWidget* table) {
+        const auto check = [&](auto& page) {
             QSignalSpy ticks(&page.pacer(), &TickPacer::timeout);
             page.startComponent("failing-query");
             QTRY_COMPARE(page.status(), status);
             const int ticksAtFailure = int(ticks.count());
             QTRY_VERIFY_WITH_TIMEOUT(ticks.count() >= ticksAtFailure + 2, 5000);
             QVERIFY(page.pacer().isArmed());
-            QCOMPARE(table->rowCount(), 0);
+            QCOMPARE(page.model()->rowCount(), 0);
             QCOMPARE(page.status(), status);
             QCOMPARE(page.state(), state);
             QVERIFY(!page.isComplete() && !page.canSearch());
         };
         if (registry) {
             RegistryListView page;
-            check(page, page._registryTable);
+            check(page);
         } else {
             ModuleListView page;
-            check(page, page._moduleTable);
+            check(page);
         }
     }
 
@@ -533,7 +547,7 @@ private slots:
         page.startComponent("no-entries");
         QVERIFY(fillByHand(page));
         QCOMPARE(page.state(), GatewayComponentWidget::Complete);
-        QCOMPARE(page._registryTable->rowCount(), 0);
+        QCOMPARE(page.model()->rowCount(), 0);
         QVERIFY(!page.canSearch());
         QCOMPARE(page.xmlReport(), QString("<!DOCTYPE registrylist>\n<entries/>\n"));
     }

@@ -5,6 +5,7 @@
 #include "LevelViewWidget.h"
 #include "PageFixtures.h"
 #include "PhoneInfoWidget.h"
+#include "RecordTableModel.h"
 #include "TestSupport.h"
 
 #include <QFileInfo>
@@ -67,29 +68,60 @@ private slots:
 )"));
     }
 
-    // Each page counts its own rows: a second page says the same as the first.
-    void reportsProgressEveryHundredRows_data()
+    // Time slices: after every tick the table holds the next classes in ascending id order,
+    // the status counts them and the state stays Processing; the last tick sorts by name,
+    // says "Ready" and completes. Each page counts its own rows.
+    void fillsInTimeSlices_data()
     {
         QTest::addColumn<int>("classes");
-        QTest::addColumn<QStringList>("statuses");
-        QTest::newRow("none") << 0 << QStringList{"Processing Class IDs", "Ready"};
-        QTest::newRow("201") << 201 << QStringList{"Processing Class IDs", "Processed 100 classes", "Processed 200 classes", "Ready"};
+        QTest::newRow("none") << 0;
+        QTest::newRow("one") << 1;
+        QTest::newRow("many slices") << 30000;
     }
 
-    void reportsProgressEveryHundredRows()
+    void fillsInTimeSlices()
     {
         QFETCH(int, classes);
-        QFETCH(QStringList, statuses);
         DeviceCache cache = numberedClasses(classes);
-        for (int page = 0; page < 2; ++page) {
-            ClassListView view;
-            QSignalSpy spy(&view, &GatewayComponentWidget::statusChanged);
-            view.setDeviceRecord(&cache);
-            QVERIFY(fillByHand(view));
-            QCOMPARE(signalTexts(spy), statuses);
-            QCOMPARE(view._classIDTable->rowCount(), classes);
-            QVERIFY(view._classIDTable->updatesEnabled() && !view._classIDTable->signalsBlocked());
-            QCOMPARE(view.state(), GatewayComponentWidget::Complete);
+        QStringList arrival; // ids in ascending order: the order the worker queues them
+        for (const IdRecord& record : std::as_const(cache.classes))
+            arrival.append(record.id);
+        for (int pass = 0; pass < 2; ++pass) {
+            const int threads = TestSupport::threadCount();
+            ClassListView page;
+            QSignalSpy statuses(&page, &GatewayComponentWidget::statusChanged);
+            QSignalSpy states(&page, &GatewayComponentWidget::stateChanged);
+            page.setDeviceRecord(&cache);
+            // The worker has queued every class.
+            QTRY_COMPARE(TestSupport::threadCount(), threads);
+            for (int ticks = 0; !page.isComplete() && ticks <= classes; ++ticks) {
+                page.onTimeElapse();
+                if (page.isComplete())
+                    break;
+                const int shown = page.model()->rowCount();
+                QCOMPARE(columnTexts(page.model(), IdColumn), arrival.mid(0, shown));
+                QCOMPARE(page.state(), GatewayComponentWidget::Processing);
+                QVERIFY(!page.canSearch() && !page._classIDTable->isSortingEnabled());
+                if (shown > 0)
+                    QCOMPARE(page.status(), QString("Processed %1 classes").arg(shown));
+            }
+            QVERIFY(page.isComplete());
+            const QStringList texts = signalTexts(statuses);
+            QCOMPARE(texts.first(), QString("Processing Class IDs"));
+            QCOMPARE(texts.last(), QString("Ready"));
+            // The counter rises and ends on the true count.
+            QStringList counted = texts.mid(1, texts.size() - 2);
+            QCOMPARE(counted.isEmpty(), classes == 0);
+            if (classes > 0)
+                QCOMPARE(counted.last(), QString("Processed %1 classes").arg(classes));
+            for (int i = 1; i < counted.size(); ++i)
+                QVERIFY(counted[i - 1].section(' ', 1, 1).toInt() < counted[i].section(' ', 1, 1).toInt());
+            QCOMPARE(signalTexts(states), QStringList({"Processing", "Complete"}));
+            QVERIFY(page.canSearch() && page._classIDTable->isSortingEnabled());
+            QCOMPARE(page.model()->rowCount(), classes);
+            // "Class 10" before "Class 2": names sort as text.
+            if (classes > 10)
+                QCOMPARE(columnTexts(page.model(), NameColumn).mid(0, 3), QStringList({"Class 0", "Class 1", "Class 10"}));
         }
     }
 
@@ -102,11 +134,11 @@ private slots:
         page.setDeviceRecord(&cache);
         QVERIFY(fillByHand(page));
         QVERIFY(QTest::qWaitForWindowExposed(&page));
-        QTableWidget* table = page._classIDTable;
+        QTableView* table = page._classIDTable;
         QSignalSpy singles(&page, &ClassListView::singleClick);
         QSignalSpy doubles(&page, &ClassListView::doubleClick);
-        QTest::mouseClick(table->viewport(), Qt::LeftButton, {}, table->visualItemRect(table->item(1, IdColumn)).center());
-        const QPoint first = table->visualItemRect(table->item(0, NameColumn)).center();
+        QTest::mouseClick(table->viewport(), Qt::LeftButton, {}, table->visualRect(page.model()->index(1, IdColumn)).center());
+        const QPoint first = table->visualRect(page.model()->index(0, NameColumn)).center();
         QTest::mouseClick(table->viewport(), Qt::LeftButton, {}, first);
         QTest::mouseDClick(table->viewport(), Qt::LeftButton, {}, first);
         QCOMPARE(signalTexts(singles), QStringList({"0x00000002", "First"}));
@@ -125,7 +157,7 @@ private slots:
         page.setDeviceRecord(&cache);
         QVERIFY(fillByHand(page));
         page._classIDTable->sortByColumn(IdColumn, Qt::DescendingOrder);
-        QCOMPARE(columnTexts(page._classIDTable, AvailableColumn), QStringList({"No", "Yes", "Yes"}));
+        QCOMPARE(columnTexts(page.model(), AvailableColumn), QStringList({"No", "Yes", "Yes"}));
         const QString report = page.xmlReport();
         QCOMPARE(report, QString("<!DOCTYPE zant-class-ids>\n"
                                  "<ZTOINFO>\n"
@@ -153,25 +185,28 @@ private slots:
         QCOMPARE(page.xmlReport(), expected);
         auto cache = std::make_unique<DeviceCache>(numberedClasses(400));
         page.setDeviceRecord(cache.get());
-        QVERIFY(tickUntil(page, [&] { return page._classIDTable->rowCount() > 0; }));
+        QVERIFY(tickUntil(page, [&] { return page.model()->rowCount() > 0; }));
         cache.reset();
         QVERIFY(fillByHand(page));
-        QCOMPARE(page._classIDTable->rowCount(), 400);
+        QCOMPARE(page.model()->rowCount(), 400);
         QCOMPARE(page.xmlReport(), expected);
     }
 
+    // Closing the window in the middle of a fill: the page goes with rows still queued, its
+    // worker ends, and nothing is touched afterwards.
     void destroyedWhileFillingEndsItsWorker()
     {
-        // Far more than teardown waits for: only a worker that stops ends in time.
-        DeviceCache cache = numberedClasses(20000);
+        DeviceCache cache = numberedClasses(30000);
         const int threads = TestSupport::threadCount();
         auto page = std::make_unique<ClassListView>();
         page->setDeviceRecord(&cache);
-        QVERIFY(tickUntil(*page, [&] { return page->_classIDTable->rowCount() > 0; }));
-        QVERIFY(TestSupport::threadCount() > threads);
+        QVERIFY(tickUntil(*page, [&] { return page->model()->rowCount() > 0; }));
+        QVERIFY(!page->isComplete());
         page.reset();
         QTRY_COMPARE(TestSupport::threadCount(), threads);
+        QTest::qWait(20);
     }
+
     // Families sorted without regard to case and named as first met; sub-families keep
     // their case; the rest in the order the classes came (ascending ids).
     void groupsByFamilyAndSubFamily()

@@ -282,14 +282,15 @@ private slots:
     {
         DeviceWindow* window = openWindow();
         window->action_Modules->trigger();
-        QTableWidget* table = window->_moduleListView->_moduleTable;
+        QTableView* table = window->_moduleListView->_moduleTable;
         QTRY_VERIFY_WITH_TIMEOUT(window->_moduleListView->isComplete(), 20000);
-        const QList<QTableWidgetItem*> found = table->findItems("odd", Qt::MatchExactly);
+        const QModelIndexList found = table->model()->match(table->model()->index(0, 0), Qt::DisplayRole, "odd", -1,
+                                                            Qt::MatchExactly);
         QCOMPARE(found.size(), 1);
-        table->scrollToItem(found.first());
+        table->scrollTo(found.first());
         // Through the window, as the platform delivers it: a widget-level double-click is never
         // paired with its press.
-        const QPoint centre = table->visualItemRect(found.first()).center();
+        const QPoint centre = table->visualRect(found.first()).center();
         QTest::mouseDClick(window->windowHandle(), Qt::LeftButton, {}, table->viewport()->mapTo(window, centre));
 
         ModuleInfoDialog* dialog = theOpenDialog();

@@ -1,0 +1,6 @@
+#include "SortKey.h"
+
+QString sortKey(const QString& text)
+{
+    return text.toCaseFolded();
+}
