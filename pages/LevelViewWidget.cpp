@@ -10,6 +10,7 @@
 #include <QFileInfo>
 #include <QFutureWatcher>
 #include <QHeaderView>
+#include <QThreadPool>
 #include <QtConcurrent/QtConcurrentRun>
 
 #include <algorithm>
@@ -172,7 +173,11 @@ void LevelViewWidget::showLevel(LevelRead& level)
         return;
     }
     _level1Tree->setUpdatesEnabled(false);
-    _level1Tree->clear();
+    // The level shown before goes on a pool thread: deleting tens of thousands of items
+    // would hold up the GUI thread as long as making them.
+    const QList<QTreeWidgetItem*> shown = _level1Tree->invisibleRootItem()->takeChildren();
+    if (!shown.isEmpty())
+        QThreadPool::globalInstance()->start([shown] { qDeleteAll(shown); });
     // The families come sorted as the tree sorts them: the indicator is set without sorting.
     _level1Tree->addTopLevelItems(std::exchange(level.families, {}));
     _level1Tree->header()->setSortIndicator(FamilyColumn, Qt::AscendingOrder);
