@@ -1,5 +1,8 @@
 #include "CITreeWidgetItem.h"
 
+#include <QHeaderView>
+#include <QSignalBlocker>
+
 CITreeWidgetItem::CITreeWidgetItem(int type)
     : QTreeWidgetItem(type)
 {
@@ -32,4 +35,15 @@ bool CITreeWidgetItem::operator<(const QTreeWidgetItem& other) const
     if (column == 0 && type() != other.type())
         return type() < other.type();
     return QString::compare(text(column), other.text(column), Qt::CaseInsensitive) < 0;
+}
+
+void CITreeWidgetItem::enableSortingInOrder(QTreeWidget* tree, int column, Qt::SortOrder order)
+{
+    QHeaderView* header = tree->header();
+    // No column to sort by while sorting comes on: the model declines to sort.
+    header->setSortIndicator(-1, order);
+    tree->setSortingEnabled(true);
+    // The indicator returns without telling the tree, which would sort.
+    const QSignalBlocker quiet(header);
+    header->setSortIndicator(column, order);
 }

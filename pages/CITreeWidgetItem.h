@@ -17,6 +17,11 @@ public:
 
     bool operator<(const QTreeWidgetItem& other) const override;
 
+    // Turns on sorting by column of a tree whose items are already in the order that sort
+    // gives: enabling sorting would otherwise sort the whole tree again, comparing and
+    // moving every item on the GUI thread.
+    static void enableSortingInOrder(QTreeWidget* tree, int column, Qt::SortOrder order);
+
 private:
     int m_kind = 0;
 };

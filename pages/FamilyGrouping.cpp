@@ -1,29 +1,109 @@
 #include "FamilyGrouping.h"
 
 #include "CITreeWidgetItem.h"
+#include "FamilyRule.h"
 
 #include <QTreeWidget>
 
-QTreeWidgetItem* FamilyGrouping::findFamily(const QTreeWidget* tree, const QString& family)
-{
-    return tree->findItems(family, Qt::MatchFixedString, FamilyColumn).value(0);
-}
+#include <algorithm>
 
-QTreeWidgetItem* FamilyGrouping::findSubFamily(const QTreeWidgetItem* family, const QString& subFamily)
-{
-    for (int i = 0; i < family->childCount(); ++i) {
-        if (family->child(i)->text(SubFamilyColumn) == subFamily)
-            return family->child(i);
-    }
-    return nullptr;
-}
+namespace {
 
-QTreeWidgetItem* FamilyGrouping::addSubFamily(QTreeWidgetItem* family, const QString& subFamily)
+QTreeWidgetItem* newGroup(int column, const QString& text)
 {
     auto* item = new CITreeWidgetItem;
-    item->setText(SubFamilyColumn, subFamily);
-    family->addChild(item);
+    item->setText(column, text);
     return item;
+}
+
+} // namespace
+
+FamilyGrouping::FamilyGrouping(QTreeWidget* tree)
+    : m_tree(tree)
+{
+}
+
+void FamilyGrouping::place(const QString& family, const QString& subFamily, QTreeWidgetItem* classItem)
+{
+    const QString familyKey = FamilyRule::familyKey(family);
+    auto known = m_families.find(familyKey);
+    if (known == m_families.end()) {
+        known = m_families.insert(familyKey, Family{newGroup(FamilyColumn, family), {}});
+        m_newFamilies.append(known->item);
+    }
+    const QString subFamilyKey = FamilyRule::subFamilyKey(subFamily);
+    QTreeWidgetItem*& subFamilyItem = known->subFamilies[subFamilyKey];
+    if (!subFamilyItem) {
+        subFamilyItem = newGroup(SubFamilyColumn, subFamily);
+        attach(known->item, subFamilyItem);
+    }
+    attach(subFamilyItem, classItem);
+}
+
+void FamilyGrouping::attach(QTreeWidgetItem* parent, QTreeWidgetItem* child)
+{
+    if (!parent->treeWidget()) {
+        parent->addChild(child);
+        return;
+    }
+    QList<QTreeWidgetItem*>& waiting = m_waiting[parent];
+    if (waiting.isEmpty())
+        m_parents.append(parent);
+    waiting.append(child);
+}
+
+void FamilyGrouping::flush()
+{
+    for (QTreeWidgetItem* parent : std::as_const(m_parents))
+        parent->addChildren(m_waiting.value(parent));
+    m_parents.clear();
+    m_waiting.clear();
+    insertFamilies();
+}
+
+// Each new family goes after every family that does not sort after it, as the tree's own
+// (stable) sort would put it; new families bound for one place go in together.
+void FamilyGrouping::insertFamilies()
+{
+    if (m_newFamilies.isEmpty())
+        return;
+    const auto before = [](const QTreeWidgetItem* a, const QTreeWidgetItem* b) { return *a < *b; };
+    std::stable_sort(m_newFamilies.begin(), m_newFamilies.end(), before);
+    QVector<QTreeWidgetItem*> shown;
+    shown.reserve(m_tree->topLevelItemCount());
+    for (int i = 0; i < m_tree->topLevelItemCount(); ++i)
+        shown.append(m_tree->topLevelItem(i));
+    // From the last place to the first, so that the places still to fill keep their rows.
+    for (auto end = m_newFamilies.end(); end != m_newFamilies.begin();) {
+        const int place = int(std::upper_bound(shown.cbegin(), shown.cend(), *(end - 1), before) - shown.cbegin());
+        auto first = end - 1;
+        while (first != m_newFamilies.begin()
+               && std::upper_bound(shown.cbegin(), shown.cend(), *(first - 1), before) - shown.cbegin() == place)
+            --first;
+        m_tree->insertTopLevelItems(place, QList<QTreeWidgetItem*>(first, end));
+        end = first;
+    }
+    m_newFamilies.clear();
+}
+
+QList<QTreeWidgetItem*> FamilyGrouping::items(const FamilyReport::Families& families,
+                                              const std::function<QTreeWidgetItem*(const QStringList&)>& classItem)
+{
+    QList<QTreeWidgetItem*> items;
+    items.reserve(families.size());
+    for (const FamilyReport::Family& family : families) {
+        QTreeWidgetItem* familyItem = items.emplace_back(newGroup(FamilyColumn, family.name));
+        for (const FamilyReport::SubFamily& subFamily : family.subFamilies) {
+            QTreeWidgetItem* subFamilyItem = newGroup(SubFamilyColumn, subFamily.name);
+            QList<QTreeWidgetItem*> classes;
+            classes.reserve(subFamily.classes.size());
+            for (const QStringList& cells : subFamily.classes)
+                classes.append(classItem(cells));
+            subFamilyItem->addChildren(classes);
+            familyItem->addChild(subFamilyItem);
+        }
+    }
+    return items;
 }
 
 FamilyReport::Families FamilyGrouping::families(const QTreeWidget* tree, const QList<int>& classColumns)

@@ -15,12 +15,12 @@ enum Column
     IdColumn
 };
 
-void addClass(QTreeWidgetItem* subFamily, const IdRecord& record)
+QTreeWidgetItem* classItem(const IdRecord& record)
 {
     auto* item = new CITreeWidgetItem;
     item->setText(NameColumn, record.name);
     item->setText(IdColumn, record.id);
-    subFamily->addChild(item);
+    return item;
 }
 
 } // namespace
@@ -31,6 +31,7 @@ FamilyTreeView::FamilyTreeView(QWidget* parent)
     setStatus(QStringLiteral("Starting"));
     setState(Starting);
     setupUi(this);
+    m_grouping = FamilyGrouping(_familyTree);
     _familyTree->sortByColumn(FamilyColumn, Qt::AscendingOrder);
     connect(&m_pacer, &TickPacer::timeout, this, &FamilyTreeView::onTimeElapse);
 }
@@ -83,47 +84,24 @@ void FamilyTreeView::lowerPriority()
 
 void FamilyTreeView::onTimeElapse()
 {
-    const FeedStep step = m_pending->step([this](const IdRecord& record) { insertClass(record); });
-    if (!m_pacer.pace(step, BusyMs))
+    const FeedStep step = m_pending->drain([this](const IdRecord& record) { placeClass(record); }, SliceMs);
+    m_grouping.flush();
+    if (m_placed > 0)
+        setStatus(QStringLiteral("Processed %1 classes").arg(m_placed));
+    if (!m_pacer.pace(step, 0))
         finish();
 }
 
-void FamilyTreeView::insertClass(const IdRecord& record)
+void FamilyTreeView::placeClass(const IdRecord& record)
 {
-    QTreeWidgetItem* family = FamilyGrouping::findFamily(_familyTree, record.family);
-    if (!family) {
-        // Built whole before it joins the tree: one insertion for the view to handle.
-        family = new CITreeWidgetItem;
-        family->setText(FamilyColumn, record.family);
-        addClass(FamilyGrouping::addSubFamily(family, record.subFamily), record);
-        _familyTree->insertTopLevelItem(familyPosition(family), family);
-        return;
-    }
-    QTreeWidgetItem* subFamily = FamilyGrouping::findSubFamily(family, record.subFamily);
-    if (!subFamily)
-        subFamily = FamilyGrouping::addSubFamily(family, record.subFamily);
-    addClass(subFamily, record);
-}
-
-// Where the tree's own sort would put a new family: after every family that does not sort
-// after it.
-int FamilyTreeView::familyPosition(const QTreeWidgetItem* family) const
-{
-    int low = 0;
-    int high = _familyTree->topLevelItemCount();
-    while (low < high) {
-        const int middle = low + (high - low) / 2;
-        if (*family < *_familyTree->topLevelItem(middle))
-            high = middle;
-        else
-            low = middle + 1;
-    }
-    return low;
+    m_grouping.place(record.family, record.subFamily, classItem(record));
+    ++m_placed;
 }
 
 void FamilyTreeView::finish()
 {
-    _familyTree->setSortingEnabled(true);
+    // The fill kept the tree in the order of its sort: sorting comes back without sorting again.
+    CITreeWidgetItem::enableSortingInOrder(_familyTree, FamilyColumn, Qt::AscendingOrder);
     // Only the families show yet; the other columns have their width from the form.
     _familyTree->resizeColumnToContents(FamilyColumn);
     setStatus(readyStatus());

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "FamilyGrouping.h"
 #include "GatewayComponentWidget.h"
 #include "IdRecord.h"
 #include "PageFeed.h"
@@ -12,16 +13,17 @@
 struct DeviceCache;
 
 // The family tree page: the device's available classes grouped by family, then sub-family.
-// A worker queues the classes from the device's record; the tick inserts one per turn.
+// A worker queues the classes from the device's record; each tick inserts classes for a
+// slice of SliceMs (at least one) and then lets the event loop run.
 class FamilyTreeView : public GatewayComponentWidget, public Ui::FamilyTreeViewClass
 {
     Q_OBJECT
 
 public:
-    static constexpr int FirstTickMs = 500;
+    static constexpr int FirstTickMs = 20;
     static constexpr int IdleStartMs = 0;
     static constexpr int IdleCapMs = 500;
-    static constexpr int BusyMs = 1;
+    static constexpr int SliceMs = 8;
 
     explicit FamilyTreeView(QWidget* parent = nullptr);
 
@@ -43,13 +45,15 @@ public slots:
     void onTimeElapse();
 
 private:
-    void insertClass(const IdRecord& record);
-    int familyPosition(const QTreeWidgetItem* family) const;
+    void placeClass(const IdRecord& record);
     void finish();
 
     DeviceCache* m_record = nullptr;
     QSharedPointer<PageFeed<IdRecord>> m_pending = QSharedPointer<PageFeed<IdRecord>>::create();
     TickPacer m_pacer{IdleStartMs, IdleCapMs};
+    FamilyGrouping m_grouping{nullptr}; // on _familyTree once the form is set up
+    int m_placed = 0;
     QString m_report;
+    // Last, so the worker is stopped before anything it reports to goes.
     PageWorker m_worker;
 };

@@ -12,13 +12,9 @@ FamilyTreeViewThread::FamilyTreeViewThread(GatewayComponentWidget* page, IdRecor
 void FamilyTreeViewThread::work()
 {
     reportStatus(QStringLiteral("Processing Class IDs"), GatewayComponentWidget::Processing);
-    QDeadlineTimer nextStep = QDeadlineTimer::current(Qt::PreciseTimer);
     const QVector<IdRecord> shown = FamilyReport::availableClasses(m_classes);
-    for (const IdRecord& record : shown) {
-        m_feed->append(record);
-        nextStep += StepMs;
-        if (!pauseUntil(nextStep))
-            return;
-    }
+    if (isStopRequested())
+        return;
+    m_feed->append(shown);
     m_feed->close();
 }

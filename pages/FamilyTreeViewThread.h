@@ -7,15 +7,11 @@
 #include <QSharedPointer>
 
 // Queues the classes the family tree shows (FamilyReport::availableClasses, in ascending id
-// order) for its page, one class per step with a short sleep between. The feed is closed
-// once every class has been queued.
+// order) for its page, all at once, and closes the feed; the page paces their insertion.
 class FamilyTreeViewThread : public PageWorkerThread
 {
 public:
     using Feed = QSharedPointer<PageFeed<IdRecord>>;
-
-    // The time of each queued class; the steps keep this rate.
-    static constexpr unsigned long StepMs = 1;
 
     // classes is a copy: the worker never reads the device's record, which may go first.
     FamilyTreeViewThread(GatewayComponentWidget* page, IdRecordMap classes, Feed feed);

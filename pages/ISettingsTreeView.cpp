@@ -106,13 +106,14 @@ void ISettingsTreeView::onTimeElapse()
     // Read before the feed: a failure comes after the worker's last node, so a failed page
     // whose feed is empty has nothing more coming.
     const bool failed = state() == Failed;
-    const FeedStep step = m_answered->step([this](const ISettingsTreeViewThread::Node& node) { insertNode(*node); });
+    const FeedStep step =
+        m_answered->drain([this](const ISettingsTreeViewThread::Node& node) { insertNode(*node); }, SliceMs);
     if (failed && step == FeedStep::Waiting) {
         m_pacer.stop();
         endFill();
         return;
     }
-    if (m_pacer.pace(step, BusyMs))
+    if (m_pacer.pace(step, 0))
         return;
     endFill();
     setStatus(readyStatus());
@@ -152,7 +153,8 @@ void ISettingsTreeView::insertNode(const _SettingsInfo& node)
 
 void ISettingsTreeView::endFill()
 {
-    _settingsTree->setSortingEnabled(true);
+    // Each node's items went in sorted, so the tree is in the order of its sort already.
+    CITreeWidgetItem::enableSortingInOrder(_settingsTree, 0, Qt::AscendingOrder);
 }
 
 void ISettingsTreeView::onCurrentItemChanged(QTreeWidgetItem* current, QTreeWidgetItem*)

@@ -17,16 +17,17 @@ class _ZantDevice;
 
 // The settings tree page: the device's settings store as a tree of nodes, and the names and
 // values of the selected node in a table beside it. The worker crawls the store node by
-// node; the tick inserts one answered node per tick.
+// node; each tick inserts answered nodes for a slice of SliceMs (at least one) and then lets
+// the event loop run.
 class ISettingsTreeView : public GatewayComponentWidget, public Ui::ISettingsTreeViewClass
 {
     Q_OBJECT
 
 public:
-    static constexpr int FirstTickMs = 500;
+    static constexpr int FirstTickMs = 20;
     static constexpr int IdleStartMs = 0;
     static constexpr int IdleCapMs = 500;
-    static constexpr int BusyMs = 1;
+    static constexpr int SliceMs = 8;
 
     // The kind every tree item carries.
     enum ItemKind

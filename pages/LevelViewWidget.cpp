@@ -8,8 +8,13 @@
 #include "NameLibrary.h"
 
 #include <QFileInfo>
+#include <QFutureWatcher>
+#include <QHeaderView>
+#include <QThreadPool>
+#include <QtConcurrent/QtConcurrentRun>
 
 #include <algorithm>
+#include <utility>
 
 namespace {
 
@@ -22,7 +27,33 @@ enum Column
     ResultColumn
 };
 
+QTreeWidgetItem* classItem(const QStringList& cells)
+{
+    auto* item = new CITreeWidgetItem;
+    item->setText(NameColumn, cells.value(FamilyReport::NameColumn));
+    item->setText(IdColumn, cells.value(FamilyReport::IdColumn));
+    const QString result = cells.value(FamilyReport::ResultColumn);
+    item->setText(ResultColumn, result);
+    IdRecord found;
+    found.available = true;
+    item->setForeground(ResultColumn, QBrush(result == LevelReport::resultText(found) ? Qt::green : Qt::red));
+    return item;
+}
+
 } // namespace
+
+// A level read off the GUI thread: the items of its families, in no tree. Those the page
+// does not take (a read it dropped) go with the last reference.
+struct LevelViewWidget::LevelRead
+{
+    LevelRead() = default;
+    LevelRead(const LevelRead&) = delete;
+    LevelRead& operator=(const LevelRead&) = delete;
+    ~LevelRead() { qDeleteAll(families); }
+
+    bool readable = false;
+    QList<QTreeWidgetItem*> families;
+};
 
 LevelViewWidget::LevelViewWidget(QWidget* parent)
     : GatewayComponentWidget(parent)
@@ -99,6 +130,8 @@ void LevelViewWidget::onCurrentLevelChanged(int index)
 {
     setStatus(QStringLiteral("Processing"));
     setState(Processing);
+    // Whatever an earlier choice still reads is not shown.
+    const quint64 request = ++m_request;
     // The prompt, or a choice before the record arrived, leaves the page processing.
     if (!m_record)
         return;
@@ -106,19 +139,43 @@ void LevelViewWidget::onCurrentLevelChanged(int index)
     if (path.isEmpty())
         return;
 
+    auto* answer = new QFutureWatcher<std::shared_ptr<LevelRead>>(this);
+    connect(answer, &QFutureWatcherBase::finished, this, [this, answer, request] {
+        answer->deleteLater();
+        if (request == m_request)
+            showLevel(*answer->result());
+    });
+    // The worker reads a copy of the classes: the device's record may change or go meanwhile.
+    answer->setFuture(QtConcurrent::run(&LevelViewWidget::read, path, m_record->classes));
+}
+
+std::shared_ptr<LevelViewWidget::LevelRead> LevelViewWidget::read(const QString& path, const IdRecordMap& classes)
+{
+    auto level = std::make_shared<LevelRead>();
     QList<IdRecord> entries;
     QString error;
-    if (!LevelReport::check(path, m_record->classes, &entries, &error)) {
+    level->readable = LevelReport::check(path, classes, &entries, &error);
+    if (level->readable)
+        level->families = FamilyGrouping::items(FamilyReport::group(entries, LevelReport::cells), classItem);
+    return level;
+}
+
+void LevelViewWidget::showLevel(LevelRead& level)
+{
+    if (!level.readable) {
         setStatus(QStringLiteral("Level file not found"));
         setState(Failed);
         return;
     }
-
-    _level1Tree->clear();
-    for (const IdRecord& entry : std::as_const(entries))
-        insertEntry(entry);
     _level1Tree->setUpdatesEnabled(false);
-    _level1Tree->sortByColumn(FamilyColumn, Qt::AscendingOrder);
+    // The level shown before goes on a pool thread: deleting tens of thousands of items
+    // would hold up the GUI thread as long as making them.
+    const QList<QTreeWidgetItem*> shown = _level1Tree->invisibleRootItem()->takeChildren();
+    if (!shown.isEmpty())
+        QThreadPool::globalInstance()->start([shown] { qDeleteAll(shown); });
+    // The families come sorted as the tree sorts them: the indicator is set without sorting.
+    _level1Tree->addTopLevelItems(std::exchange(level.families, {}));
+    _level1Tree->header()->setSortIndicator(FamilyColumn, Qt::AscendingOrder);
     _level1Tree->expandAll();
     for (int column = FamilyColumn; column <= IdColumn; ++column)
         _level1Tree->resizeColumnToContents(column);
@@ -127,29 +184,6 @@ void LevelViewWidget::onCurrentLevelChanged(int index)
     m_report.clear();
     setStatus(readyStatus());
     setState(Complete);
-}
-
-void LevelViewWidget::insertEntry(const IdRecord& entry)
-{
-    QTreeWidgetItem* subFamily = nullptr;
-    QTreeWidgetItem* family = FamilyGrouping::findFamily(_level1Tree, entry.family);
-    if (!family) {
-        family = new CITreeWidgetItem;
-        family->setText(FamilyColumn, entry.family);
-        subFamily = FamilyGrouping::addSubFamily(family, entry.subFamily);
-        _level1Tree->addTopLevelItem(family);
-    } else {
-        subFamily = FamilyGrouping::findSubFamily(family, entry.subFamily);
-        if (!subFamily)
-            subFamily = FamilyGrouping::addSubFamily(family, entry.subFamily);
-    }
-
-    auto* item = new CITreeWidgetItem;
-    item->setText(NameColumn, entry.name);
-    item->setText(IdColumn, entry.id);
-    item->setText(ResultColumn, LevelReport::resultText(entry));
-    item->setForeground(ResultColumn, QBrush(entry.available ? Qt::green : Qt::red));
-    subFamily->addChild(item);
 }
 
 QString LevelViewWidget::xmlReport()

@@ -4,11 +4,15 @@
 #include "IdRecord.h"
 #include "ui_LevelViewWidget.h"
 
+#include <memory>
+
 struct DeviceCache;
 
 // The level page: checks the device's classes against a level definition chosen from the
 // "Levels" folder, showing each required class under its family and sub-family as found or
-// not found. A definition is read on the GUI thread when the choice changes; no worker.
+// not found. When the choice changes, a pool thread reads the definition, checks it and
+// builds the tree's items; the GUI thread only puts them in. Reads are numbered: the tree
+// shows the latest choice, and what an earlier one brings late is dropped.
 class LevelViewWidget : public GatewayComponentWidget, public Ui::LevelViewWidgetClass
 {
     Q_OBJECT
@@ -34,9 +38,13 @@ public slots:
     void onCurrentLevelChanged(int index);
 
 private:
+    struct LevelRead;
+
     void offerLevelFiles(DeviceCache* record, QStringList files);
-    void insertEntry(const IdRecord& entry);
+    static std::shared_ptr<LevelRead> read(const QString& path, const IdRecordMap& classes);
+    void showLevel(LevelRead& level);
 
     DeviceCache* m_record = nullptr;
     QString m_report;
+    quint64 m_request = 0;
 };

@@ -108,7 +108,9 @@ void expandWithAncestors(const QVector<QTreeWidgetItem*>& items)
     QSet<QTreeWidgetItem*> seen;
     QVector<QPair<int, QTreeWidgetItem*>> toExpand; // depth and item
     for (QTreeWidgetItem* item : items) {
-        for (QTreeWidgetItem* current = item; current && !seen.contains(current); current = current->parent()) {
+        // A leaf shows nothing more expanded, and the view would keep a persistent index for each.
+        QTreeWidgetItem* first = item->childCount() > 0 ? item : item->parent();
+        for (QTreeWidgetItem* current = first; current && !seen.contains(current); current = current->parent()) {
             seen.insert(current);
             toExpand.append({depth(current), current});
         }

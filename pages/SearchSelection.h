@@ -23,6 +23,6 @@ QItemSelection compactCellSelection(const QAbstractItemModel* model, QVector<QPa
 // Whole rows of the tree items, adjacent siblings joined into one range.
 QItemSelection compactRowSelection(const QTreeWidget* tree, const QVector<QTreeWidgetItem*>& items);
 
-// Expands the items and every ancestor of them. Deepest first, so that each item is
+// Expands the items that have children and every ancestor of the items. Deepest first, so that each item is
 // expanded while its parent is still collapsed: expanding a visible item costs a relayout.
 void expandWithAncestors(const QVector<QTreeWidgetItem*>& items);

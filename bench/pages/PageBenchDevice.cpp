@@ -35,14 +35,14 @@ QString simulatorPath()
     return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim");
 }
 
-bool generateImage(const QString& image, int modules, int classes)
+bool generateImage(const QString& image, int modules, int classes, int settings)
 {
-    const int result = QProcess::execute(simulatorPath(), {QStringLiteral("generate"), image, QStringLiteral("--modules"),
-                                                           QString::number(modules), QStringLiteral("--classes"),
-                                                           QString::number(classes), QStringLiteral("--files"),
-                                                           QStringLiteral("0"), QStringLiteral("--processes"),
-                                                           QStringLiteral("0")});
-    return result == 0;
+    QStringList arguments = {QStringLiteral("generate"), image, QStringLiteral("--modules"), QString::number(modules),
+                             QStringLiteral("--classes"), QString::number(classes), QStringLiteral("--files"),
+                             QStringLiteral("0"), QStringLiteral("--processes"), QStringLiteral("0")};
+    if (settings > 0)
+        arguments << QStringLiteral("--settings") << QString::number(settings);
+    return QProcess::execute(simulatorPath(), arguments) == 0;
 }
 
 QSharedPointer<_ZantDevice> connectDevice(const QString& id)
@@ -60,15 +60,16 @@ QSharedPointer<_ZantDevice> connectDevice(const QString& id)
     return nullptr;
 }
 
-QSharedPointer<_ZantDevice> serveGeneratedDevice(QProcess& server, const QTemporaryDir& work, int modules, int classes)
+QSharedPointer<_ZantDevice> serveGeneratedDevice(QProcess& server, const QTemporaryDir& work, int modules, int classes,
+                                                 int settings, const QString& id)
 {
-    const QString image = work.filePath(QStringLiteral("image"));
-    if (!work.isValid() || !generateImage(image, modules, classes)) {
+    const QString image = work.filePath(QStringLiteral("image-") + id);
+    if (!work.isValid() || !generateImage(image, modules, classes, settings)) {
         std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulatorPath()));
         return {};
     }
-    startSimulator(server, image, work.filePath(QStringLiteral("sockets")));
-    const QSharedPointer<_ZantDevice> device = connectDevice();
+    startSimulator(server, image, work.filePath(QStringLiteral("sockets")), id);
+    const QSharedPointer<_ZantDevice> device = connectDevice(id);
     if (!device)
         std::fprintf(stderr, "the simulator did not answer: %s\n", qPrintable(QString::fromLocal8Bit(server.readAll())));
     return device;

@@ -9,6 +9,7 @@
 #include "TestSupport.h"
 
 #include <QFileInfo>
+#include <QHeaderView>
 #include <QLabel>
 #include <QSignalSpy>
 #include <QTemporaryDir>
@@ -29,6 +30,38 @@ void choose(LevelViewWidget& page, const QString& path)
 {
     page._levelDocuments->addItem(QFileInfo(path).baseName(), path);
     page._levelDocuments->setCurrentIndex(page._levelDocuments->count() - 1);
+}
+
+// The same, then waits for the read, which runs on a pool thread.
+bool chooseAndWait(LevelViewWidget& page, const QString& path)
+{
+    choose(page, path);
+    return QTest::qWaitFor([&page] { return page.state() != GatewayComponentWidget::Processing; }, 30000);
+}
+
+// Family, sub-family, class count and the first and last class name of every sub-family.
+QStringList groupSummary(const QTreeWidget* tree)
+{
+    QStringList lines;
+    for (int f = 0; f < tree->topLevelItemCount(); ++f) {
+        const QTreeWidgetItem* family = tree->topLevelItem(f);
+        for (int s = 0; s < family->childCount(); ++s) {
+            const QTreeWidgetItem* sub = family->child(s);
+            lines.append(QString("%1/%2: %3, %4..%5")
+                             .arg(family->text(0), sub->text(1))
+                             .arg(sub->childCount())
+                             .arg(sub->child(0)->text(2), sub->child(sub->childCount() - 1)->text(2)));
+        }
+    }
+    return lines;
+}
+
+int classItems(const QTreeWidget* tree)
+{
+    int classes = 0;
+    for (QTreeWidgetItemIterator it(const_cast<QTreeWidget*>(tree)); *it; ++it)
+        classes += (*it)->parent() && (*it)->parent()->parent() ? 1 : 0;
+    return classes;
 }
 
 enum Column { NameColumn, IdColumn, FamilyColumn, SubFamilyColumn, AvailableColumn, PathColumn };
@@ -224,15 +257,66 @@ private slots:
         });
         FamilyTreeView page;
         QSignalSpy states(&page, &GatewayComponentWidget::stateChanged);
+        QSignalSpy statuses(&page, &GatewayComponentWidget::statusChanged);
         page.setDeviceRecord(&cache);
         // Left to its own timer.
         QTRY_VERIFY_WITH_TIMEOUT(page.isComplete(), 30000);
+        QCOMPARE(signalTexts(statuses), QStringList({"Processing Class IDs", "Processed 7 classes", "Ready"}));
         QCOMPARE(treeLines(page._familyTree),
                  QStringList({"alpha|||", " |Memory||", "  ||Heap|0x00000008", "Media|||", " |Audio||", "  ||Player|0x00000001",
                               "  ||Tuner|0x00000004", " |Video||", "  ||Camera|0x00000002", " |audio||", "  ||Mixer|0x00000003",
                               "unknown|||", " |unknown||", "  ||unknown|0x00000005", "zeta|||", " |Time||", "  ||Clock|0x00000007"}));
         QCOMPARE(signalTexts(states), QStringList({"Processing", "Complete"}));
         QVERIFY(page._familyTree->isSortingEnabled());
+    }
+
+    // Ticked by hand: after every tick the tree holds exactly the classes its status counts,
+    // its families in order; the counts climb to the true one, then "Ready". Destroying a
+    // page in the middle of its fill ends its worker.
+    void fillsInTimeSlices()
+    {
+        QList<IdRecord> records;
+        const QStringList families = {"beta", "Alpha", "ALPHA"};
+        for (int k = 0; k < 2400; ++k)
+            records.append(makeClass(formatId(0x7E000001 + quint32(k)), QString("Class %1").arg(k), families.at(k % 3),
+                                     QString("S%1").arg(k / 1200)));
+        DeviceCache cache = cacheOf(records);
+        FamilyTreeView page;
+        QSignalSpy statuses(&page, &GatewayComponentWidget::statusChanged);
+        page.setDeviceRecord(&cache);
+        QStringList mismatches;
+        QVERIFY(tickUntil(page, [&] {
+            const QString counted = QString("Processed %1 classes").arg(classItems(page._familyTree));
+            if (page.status().startsWith("Processed") && page.status() != counted)
+                mismatches.append(page.status() + " with " + counted);
+            for (int f = 1; f < page._familyTree->topLevelItemCount(); ++f) {
+                if (*page._familyTree->topLevelItem(f) < *page._familyTree->topLevelItem(f - 1))
+                    mismatches.append("families out of order");
+            }
+            return page.isComplete();
+        }));
+        QCOMPARE(mismatches, QStringList());
+        const QStringList texts = signalTexts(statuses);
+        QCOMPARE(texts.first(), QString("Processing Class IDs"));
+        QCOMPARE(texts.mid(texts.size() - 2), QStringList({"Processed 2400 classes", "Ready"}));
+        int previous = 0;
+        for (const QString& text : texts.mid(1, texts.size() - 2)) {
+            const int count = text.section(' ', 1, 1).toInt();
+            QVERIFY2(text == QString("Processed %1 classes").arg(count) && count > previous, qPrintable(text));
+            previous = count;
+        }
+        QCOMPARE(groupSummary(page._familyTree),
+                 QStringList({"Alpha/S0: 800, Class 1..Class 1199", "Alpha/S1: 800, Class 1201..Class 2399",
+                              "beta/S0: 400, Class 0..Class 1197", "beta/S1: 400, Class 1200..Class 2397"}));
+
+        DeviceCache large = numberedClasses(20000);
+        const int threads = TestSupport::threadCount();
+        auto filling = std::make_unique<FamilyTreeView>();
+        filling->setDeviceRecord(&large);
+        QVERIFY(tickUntil(*filling, [&] { return filling->_familyTree->topLevelItemCount() > 0; }));
+        QVERIFY(!filling->isComplete());
+        filling.reset();
+        QTRY_COMPARE(TestSupport::threadCount(), threads);
     }
 
     // The export follows the tree as the user sorted it, frozen at the first call; without
@@ -247,20 +331,21 @@ private slots:
             QVERIFY(fillByHand(page));
             QCOMPARE(page._familyTree->topLevelItemCount(), 0);
         }
-        DeviceCache cache = cacheOf({makeClass("0x00000001", "beta", "Media", "Audio"),
-                                     makeClass("0x00000002", "Alpha", "Media", "Audio"),
+        DeviceCache cache = cacheOf({makeClass("0x00000001", "alpha", "Media", "Audio"),
+                                     makeClass("0x00000002", "Beta", "Media", "Audio"),
                                      makeClass("0x00000003", "Heap", "Kernel", "Memory")});
         FamilyTreeView page;
         page.setDeviceRecord(&cache);
         QVERIFY(fillByHand(page));
-        page._familyTree->sortByColumn(2, Qt::DescendingOrder);
+        // As a click on the header does: by name, without regard to case.
+        page._familyTree->header()->setSortIndicator(2, Qt::DescendingOrder);
         const QString expected = "<!DOCTYPE familyTree>\n"
                                  "<deviceTree device=\"0x0A110021\" manufacturer=\"Zantro &amp; Sons\">\n"
                                  " <family name=\"Kernel\">\n  <subfamily name=\"Memory\">\n"
                                  "   <class name=\"Heap\" classid=\"0x00000003\"/>\n"
                                  "  </subfamily>\n </family>\n <family name=\"Media\">\n  <subfamily name=\"Audio\">\n"
-                                 "   <class name=\"beta\" classid=\"0x00000001\"/>\n"
-                                 "   <class name=\"Alpha\" classid=\"0x00000002\"/>\n"
+                                 "   <class name=\"Beta\" classid=\"0x00000002\"/>\n"
+                                 "   <class name=\"alpha\" classid=\"0x00000001\"/>\n"
                                  "  </subfamily>\n </family>\n</deviceTree>\n";
         QCOMPARE(page.xmlReport(), expected);
         page._familyTree->sortByColumn(2, Qt::AscendingOrder);
@@ -300,13 +385,20 @@ private slots:
         LevelViewWidget page;
         page.setDeviceRecord(&cache);
         QCOMPARE(page.xmlReport(), QString("<!DOCTYPE levelreport>\n<device/>\n"));
-        choose(page, first);
+        QVERIFY(chooseAndWait(page, first));
         QCOMPARE(page.xmlReport(), QString("<!DOCTYPE levelreport>\n<device>\n <family name=\"Media\">\n  <subfamily name=\"Audio\">\n"
                                            "   <class name=\"Player\" classid=\"0x01000001\" available=\"Found\"/>\n"
                                            "  </subfamily>\n </family>\n</device>\n"));
         QSignalSpy statuses(&page, &GatewayComponentWidget::statusChanged);
-        choose(page, m_small);
+        QVERIFY(chooseAndWait(page, m_small));
         QCOMPARE(signalTexts(statuses), QStringList({"Processing", "Ready"}));
+        QCOMPARE(treeLines(page._level1Tree),
+                 QStringList({"||||", " ||||", "  ||Missing|0x01000099|Not Found", "  ||AlsoMissing|0x01000098|Not Found",
+                              "Kernel||||", " |Memory|||", "  ||FromFile|0x0100000A|Found", "media||||", " |Video|||",
+                              "  ||Camera|0x01000002|Found", " |Audio|||", "  ||Player|0x01000001|Found", " |audio|||",
+                              "  ||Mixer|0x01000003|Not Found"}));
+        for (QTreeWidgetItemIterator it(page._level1Tree, QTreeWidgetItemIterator::NoChildren); *it; ++it)
+            QCOMPARE((*it)->foreground(4).color(), QColor((*it)->text(4) == "Found" ? Qt::green : Qt::red));
         QCOMPARE(page.state(), GatewayComponentWidget::Complete);
         for (QTreeWidgetItemIterator it(page._level1Tree, QTreeWidgetItemIterator::HasChildren); *it; ++it)
             QVERIFY((*it)->isExpanded());
@@ -326,7 +418,7 @@ private slots:
                                  "  </subfamily>\n </family>\n</device>\n"));
         // Choosing a level that cannot be read, or the prompt again, keeps the tree and its export.
         const QStringList tree = treeLines(page._level1Tree);
-        choose(page, m_folder.filePath("missing.xml"));
+        QVERIFY(chooseAndWait(page, m_folder.filePath("missing.xml")));
         QCOMPARE(page.status(), QString("Level file not found"));
         QCOMPARE(page.state(), GatewayComponentWidget::Failed);
         QVERIFY(!page.isComplete() && !page.canSearch());
@@ -339,12 +431,22 @@ private slots:
         QCOMPARE(treeLines(page._level1Tree), tree);
     }
 
-    void choiceBeforeTheRecordStaysProcessing()
+    // A choice before the record stays processing. Of two choices in a row the page shows
+    // the later, whatever the reads of both bring.
+    void latestChoiceIsShown()
     {
         LevelViewWidget page;
         choose(page, m_small);
         QCOMPARE(page.status(), QString("Processing"));
         QCOMPARE(page._level1Tree->topLevelItemCount(), 0);
+        DeviceCache cache = smallDevice();
+        page.setDeviceRecord(&cache);
+        choose(page, m_small);
+        QVERIFY(chooseAndWait(page, m_folder.filePath("missing.xml")));
+        QCOMPARE(page.status(), QString("Level file not found"));
+        QTest::qWait(50);
+        QCOMPARE(page._level1Tree->topLevelItemCount(), 0);
+        QCOMPARE(page.state(), GatewayComponentWidget::Failed);
     }
 
     void formatSize()
