@@ -30,7 +30,7 @@ public:
 
     // Starts the worker on record's classes (the record stays the device's); null, or a
     // second call, starts nothing.
-    void setDeviceRecord(DeviceCache* record);
+    void setDeviceRecord(const DeviceCache* record);
 
     const TickPacer& pacer() const;
 
@@ -57,7 +57,7 @@ private:
     void setTableQuiet(bool quiet);
     void finish();
 
-    DeviceCache* m_record = nullptr;
+    const DeviceCache* m_record = nullptr;
     QSharedPointer<PageFeed<IdRecord>> m_pending = QSharedPointer<PageFeed<IdRecord>>::create();
     TickPacer m_pacer{IdleStartMs, IdleCapMs};
     // Rows shown by this page; each page counts from zero.

@@ -19,8 +19,8 @@ public:
     // Offers the level files for record's device (the record stays the device's), sorted by
     // name; null offers nothing. The files are those of the "Levels" folder beside the
     // program, or of levelsDirectory.
-    void setDeviceRecord(DeviceCache* record);
-    void setDeviceRecord(DeviceCache* record, const QString& levelsDirectory);
+    void setDeviceRecord(const DeviceCache* record);
+    void setDeviceRecord(const DeviceCache* record, const QString& levelsDirectory);
 
 public slots:
     QString componentName() override;
@@ -35,9 +35,9 @@ public slots:
     void onCurrentLevelChanged(int index);
 
 private:
-    void offerLevelFiles(DeviceCache* record, QStringList files);
+    void offerLevelFiles(const DeviceCache* record, QStringList files);
     void insertEntry(const IdRecord& entry);
 
-    DeviceCache* m_record = nullptr;
+    const DeviceCache* m_record = nullptr;
     QString m_report;
 };

@@ -1,5 +1,6 @@
 #include "Report.h"
 
+#include "XmlEscape.h"
 #include "XmlReport.h"
 
 #include <QJsonArray>
@@ -14,7 +15,7 @@ void writeXml(QXmlStreamWriter& xml, const ReportNode& node)
 {
     xml.writeStartElement(node.element);
     for (const auto& attribute : node.attributes)
-        xml.writeAttribute(attribute.first, attribute.second);
+        xml.writeAttribute(attribute.first, XmlEscape::escaped(attribute.second));
     for (const ReportNode& child : node.children)
         writeXml(xml, child);
     xml.writeEndElement();

@@ -147,7 +147,7 @@ int main(int argc, char** argv)
     if (!device)
         return 1;
     out() << QStringLiteral("image: %1 modules, %2 classes; peak memory before the pages: %3 MB\n")
-                 .arg(modules).arg(device->cache.classes.size()).arg(peakMemoryMb());
+                 .arg(modules).arg(device->cache()->classes.size()).arg(peakMemoryMb());
 
     {
         DeviceWindow window;
@@ -170,7 +170,7 @@ int main(int argc, char** argv)
         window.show();
         window.action_Class_IDs->trigger();
         const Fill fill = fillWithHeartbeat(window._classListView, window._classListView->_classIDTable);
-        const qint64 pacing = qint64(device->cache.classes.size()) * qint64(ClassListViewThread::StepMs);
+        const qint64 pacing = qint64(device->cache()->classes.size()) * qint64(ClassListViewThread::StepMs);
         report(QStringLiteral("class id list"), window._classListView, window._classListView->_classIDTable,
                sinceStart.elapsed(), pacing * 6 / 5, fill, {QStringLiteral("777"), QStringLiteral("not")});
     }

@@ -190,7 +190,7 @@ int main(int argc, char** argv)
     const QSharedPointer<_ZantDevice> device = serveGeneratedDevice(server, work, modules, classes);
     if (!device)
         return 1;
-    const int known = int(device->cache.classes.size());
+    const int known = int(device->cache()->classes.size());
     out() << QStringLiteral("image: %1 modules, %2 classes; peak memory before the pages: %3 MB\n")
                  .arg(modules).arg(known).arg(peakMemoryMb());
     const QStringList treeSearches = {QStringLiteral("4E2"), QStringLiteral("not")};
@@ -199,7 +199,7 @@ int main(int argc, char** argv)
         FamilyTreeView page;
         page.resize(900, 600);
         page.show();
-        const Fill fill = runWithHeartbeat(&page, [&] { page.setDeviceRecord(&device->cache); }, StartCounts::Not);
+        const Fill fill = runWithHeartbeat(&page, [&] { page.setDeviceRecord(device->cache().data()); }, StartCounts::Not);
         report(QStringLiteral("family tree, alone"), &page, page._familyTree, fill, pacingTarget(fill.readyMs, known),
                treeSearches);
     }
@@ -222,7 +222,7 @@ int main(int argc, char** argv)
         window._actionLevelView->trigger();
         LevelViewWidget* page = window._levelViewWidget;
         const QString fullLevel = work.filePath(QStringLiteral("Everything.xml"));
-        if (!writeFullLevel(fullLevel, device->cache.classes)) {
+        if (!writeFullLevel(fullLevel, device->cache()->classes)) {
             std::fprintf(stderr, "cannot write %s\n", qPrintable(fullLevel));
             return 1;
         }
