@@ -186,8 +186,10 @@ void Delvix::connectToDevice(const QString& targetId)
     QGuiApplication::setOverrideCursor(Qt::BusyCursor);
     m_connects.start([this, device, targetId] {
         QString failure;
-        if (!Portlex::ConnectDevice(device, QString(), QString()))
-            failure = QString("Failure Code: (%1) ").arg(Portlex::LastError()) + Portlex::LastStatus();
+        int code = 0;
+        QString reason;
+        if (!Portlex::ConnectDevice(device, QString(), QString(), &code, &reason))
+            failure = QString("Failure Code: (%1) ").arg(code) + reason;
         QMetaObject::invokeMethod(this, [this, targetId, failure] { connectFinished(targetId, failure); },
                                   Qt::QueuedConnection);
     });

@@ -179,10 +179,11 @@ void DeviceWindow::setDevice(const QString& deviceId)
         restorePlacement(m_device->name);
         m_lockStatus->setDevice(deviceId);
         _phoneInfoWidget->startComponent(deviceId);
-        _phoneInfoWidget->setDeviceRecord(&m_device->cache);
-        _classListView->setDeviceRecord(&m_device->cache);
-        _levelViewWidget->setDeviceRecord(&m_device->cache);
-        _familyTreeView->setDeviceRecord(&m_device->cache);
+        m_cache = m_device->cache();
+        _phoneInfoWidget->setDeviceRecord(m_cache.data());
+        _classListView->setDeviceRecord(m_cache.data());
+        _levelViewWidget->setDeviceRecord(m_cache.data());
+        _familyTreeView->setDeviceRecord(m_cache.data());
     }
 
     _stackedWidget->setCurrentIndex(0);

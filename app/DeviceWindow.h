@@ -12,6 +12,7 @@ class QLabel;
 class QLineEdit;
 class QTimer;
 class _ZantDevice;
+struct DeviceCache;
 
 // The window of one device: its pages in a stack, switched from the toolbar or the View
 // menu, the current page's status in the status bar, a search box and the XML export.
@@ -60,6 +61,7 @@ private:
 
     QString m_deviceId;
     QSharedPointer<_ZantDevice> m_device;
+    QSharedPointer<const DeviceCache> m_cache;  // the record the pages read, held while they do
     GatewayComponentWidget* m_currentPage = nullptr;
     QLabel* m_status = nullptr;
     LockStatusWidget* m_lockStatus = nullptr;

@@ -5,10 +5,10 @@
 #include "FileCommands.h"
 #include "Portlex.h"
 #include "PortlexErrors.h"
+#include "SafeOutputFile.h"
 #include "ToolCommands.h"
 
 #include <QCoreApplication>
-#include <QSaveFile>
 
 #include <cstdio>
 #include <unistd.h>
@@ -60,6 +60,8 @@ const char* const OptionsHelp =
     "  -h, --help              this help, or a command's help\n"
     "\n"
     "DEVICE is a device id or a unique part of its display name (see \"devices\").\n"
+    "-o and pull replace only a regular file: a link or a device node there is refused.\n"
+    "XML writes characters it cannot carry as {U+XXXX} (\"{U+\" itself as {U+007B}U+).\n"
     "\n"
     "Exit status: 0 success; 1 the level is not met, or the scans differ (with\n"
     "--fail-on-difference); 2 usage error; 3 no such device, or it refused the connection;\n"
@@ -184,6 +186,11 @@ int Cli::help(const CliCommand* command)
 
 QSharedPointer<_ZantDevice> Cli::connect(const QString& spec, int* exitCode)
 {
+    // "" is part of every name: it would pick the only device there is, whichever it is.
+    if (spec.isEmpty()) {
+        *exitCode = usage(QStringLiteral("DEVICE must not be empty"));
+        return {};
+    }
     QList<QPair<QString, QString>> devices;
     Portlex::GetDevices(devices);
     QString id;
@@ -207,15 +214,12 @@ QSharedPointer<_ZantDevice> Cli::connect(const QString& spec, int* exitCode)
         *exitCode = fail(ExitNoDevice, QStringLiteral("no device \"%1\" (\"%2 devices\" lists them)").arg(spec, QLatin1String(ToolName)));
         return {};
     }
-    if (!Portlex::ConnectDevice(device, QString(), QString())) {
-        *exitCode = fail(ExitNoDevice, QStringLiteral("%1 refused the connection: error %2 %3")
-                                           .arg(id)
-                                           .arg(Portlex::LastError())
-                                           .arg(Portlex::LastStatus()));
+    int code = 0;
+    QString reason;
+    if (!Portlex::ConnectDevice(device, QString(), QString(), &code, &reason)) {
+        *exitCode = fail(ExitNoDevice, QStringLiteral("%1 refused the connection: error %2 %3").arg(id).arg(code).arg(reason));
         return {};
     }
-    // The greeting is no reason for a later failure.
-    device->statusText.clear();
     *exitCode = ExitSuccess;
     return device;
 }
@@ -235,8 +239,8 @@ int Cli::emitReport(const Report& report)
             return fail(ExitGatewayError, QStringLiteral("could not write the output"));
         return ExitSuccess;
     }
-    QSaveFile file(m_output);
-    if (!file.open(QIODevice::WriteOnly) || file.write(bytes) != bytes.size() || !file.commit())
+    SafeOutputFile file(m_output);
+    if (!file.open() || !file.write(bytes) || !file.commit())
         return fail(ExitGatewayError, QStringLiteral("could not write %1: %2").arg(m_output, file.errorString()));
     return ExitSuccess;
 }
@@ -248,14 +252,14 @@ int Cli::fail(int code, const QString& message)
     return code;
 }
 
-int Cli::gatewayFailure(const QString& what, int code, const _ZantDevice* device)
+int Cli::gatewayFailure(const QString& what, int code, const QString& reason)
 {
     QString message = QStringLiteral("%1 failed: error %2").arg(what).arg(code);
     const QString meaning = codeMeaning(code);
     if (!meaning.isEmpty())
         message += QStringLiteral(" (%1)").arg(meaning);
-    if (device && !device->statusText.isEmpty())
-        message += QStringLiteral(": ") + device->statusText;
+    if (!reason.isEmpty())
+        message += QStringLiteral(": ") + reason;
     return fail(ExitGatewayError, message);
 }
 

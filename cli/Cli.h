@@ -31,12 +31,13 @@ public:
     int onDevice(const QString& spec, const std::function<int(_ZantDevice& device)>& work);
 
     // Writes the report in the chosen format to the output: standard output, or the -o
-    // file through a save file. Returns the exit status.
+    // file through a SafeOutputFile (never through a link, never over a device node).
+    // Returns the exit status.
     int emitReport(const Report& report);
     // A message on the error stream; returns code.
     int fail(int code, const QString& message);
-    // A failed gateway call: its code and the device's word on it. Returns ExitGatewayError.
-    int gatewayFailure(const QString& what, int code, const _ZantDevice* device);
+    // A failed gateway call: its code and the call's reason. Returns ExitGatewayError.
+    int gatewayFailure(const QString& what, int code, const QString& reason);
 
     // Progress on the error stream, when that is a terminal; the gateway's callback form,
     // with this tool as context. Never asks to stop.

@@ -29,8 +29,9 @@ int modules(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
         QVector<ModuleInfo> found;
-        if (const int result = device.GetModules(found, nullptr, nullptr))
-            return cli.gatewayFailure(QStringLiteral("reading the modules"), result, &device);
+        QString reason;
+        if (const int result = device.GetModules(found, nullptr, nullptr, &reason))
+            return cli.gatewayFailure(QStringLiteral("reading the modules"), result, reason);
         QVector<QStringList> rows;
         rows.reserve(found.size());
         for (const ModuleInfo& module : std::as_const(found))
@@ -43,28 +44,30 @@ int modules(Cli& cli, const QStringList& arguments)
 int info(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
-        return cli.emitReport(PhoneInfoReport::build(device.cache.deviceData));
+        return cli.emitReport(PhoneInfoReport::build(device.cache()->deviceData));
     });
 }
 
 int classes(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
+        const QSharedPointer<const DeviceCache> cache = device.cache();
         QVector<QStringList> rows;
-        rows.reserve(device.cache.classes.size());
-        for (const IdRecord& record : std::as_const(device.cache.classes))
+        rows.reserve(cache->classes.size());
+        for (const IdRecord& record : cache->classes)
             rows.append(ClassReport::cells(record));
         Report::sortRows(rows, ClassReport::NameColumn);
-        return cli.emitReport(ClassReport::build(rows, device.cache.deviceData));
+        return cli.emitReport(ClassReport::build(rows, cache->deviceData));
     });
 }
 
 int familyTree(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
+        const QSharedPointer<const DeviceCache> cache = device.cache();
         const FamilyReport::Families families =
-            FamilyReport::group(FamilyReport::availableClasses(device.cache.classes), FamilyReport::treeCells);
-        return cli.emitReport(FamilyReport::familyTree(families, device.cache.deviceData));
+            FamilyReport::group(FamilyReport::availableClasses(cache->classes), FamilyReport::treeCells);
+        return cli.emitReport(FamilyReport::familyTree(families, cache->deviceData));
     });
 }
 
@@ -72,8 +75,9 @@ int registry(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
         QVector<RegistryInfo> entries;
-        if (const int result = device.GetRegistry(entries, nullptr, nullptr))
-            return cli.gatewayFailure(QStringLiteral("reading the registry"), result, &device);
+        QString reason;
+        if (const int result = device.GetRegistry(entries, nullptr, nullptr, &reason))
+            return cli.gatewayFailure(QStringLiteral("reading the registry"), result, reason);
         QVector<QStringList> rows;
         rows.reserve(entries.size());
         for (const RegistryInfo& entry : std::as_const(entries))
@@ -125,7 +129,7 @@ int level(Cli& cli, const QStringList& arguments)
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
         QList<IdRecord> entries;
         QString error;
-        if (!LevelReport::check(path, device.cache.classes, &entries, &error))
+        if (!LevelReport::check(path, device.cache()->classes, &entries, &error))
             return cli.fail(ExitGatewayError, QStringLiteral("cannot read the level %1: %2").arg(path, error));
         const int written = cli.emitReport(FamilyReport::levelReport(FamilyReport::group(entries, LevelReport::cells)));
         if (written != ExitSuccess)

@@ -17,8 +17,9 @@ int settings(Cli& cli, const QStringList& arguments)
         while (!pending.isEmpty()) {
             auto node = QSharedPointer<_SettingsInfo>::create();
             node->SetPath(pending.takeLast());
-            if (const int result = device.GetChildSettings(node))
-                return cli.gatewayFailure(QStringLiteral("reading the settings at %1").arg(node->Path()), result, &device);
+            QString reason;
+            if (const int result = device.GetChildSettings(node, &reason))
+                return cli.gatewayFailure(QStringLiteral("reading the settings at %1").arg(node->Path()), result, reason);
             for (auto child = node->children.crbegin(); child != node->children.crend(); ++child)
                 pending.append((*child)->Path());
             nodes.append(*node);
@@ -31,8 +32,9 @@ int processes(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
         QVector<ProcessInfo> found;
-        if (const int result = device.GetProcesses(found))
-            return cli.gatewayFailure(QStringLiteral("reading the processes"), result, &device);
+        QString reason;
+        if (const int result = device.GetProcesses(found, &reason))
+            return cli.gatewayFailure(QStringLiteral("reading the processes"), result, reason);
         return cli.emitReport(ProcessReport::build(found));
     });
 }
@@ -41,8 +43,9 @@ int loadedModules(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
         QVector<LoadedModuleInfo> found;
-        if (const int result = device.GetLoadedModules(found))
-            return cli.gatewayFailure(QStringLiteral("reading the loaded modules"), result, &device);
+        QString reason;
+        if (const int result = device.GetLoadedModules(found, &reason))
+            return cli.gatewayFailure(QStringLiteral("reading the loaded modules"), result, reason);
         return cli.emitReport(LoadedModuleReport::build(found));
     });
 }

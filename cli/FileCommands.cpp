@@ -16,8 +16,9 @@ int list(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
         QSharedPointer<_DirectoryInfo> level;
-        if (const int result = device.GetFileSystemLevel(arguments.at(1), level, nullptr, nullptr))
-            return cli.gatewayFailure(QStringLiteral("listing %1").arg(arguments.at(1)), result, &device);
+        QString reason;
+        if (const int result = device.GetFileSystemLevel(arguments.at(1), level, nullptr, nullptr, &reason))
+            return cli.gatewayFailure(QStringLiteral("listing %1").arg(arguments.at(1)), result, reason);
         return cli.emitReport(FolderReport::build(*level));
     });
 }
@@ -29,10 +30,11 @@ int pull(Cli& cli, const QStringList& arguments)
         QString target = arguments.at(2);
         if (QFileInfo(target).isDir())
             target = QDir(target).filePath(source.mid(source.lastIndexOf(QLatin1Char('/')) + 1));
-        const int result = device.CopyFileToPC(source, target, &Cli::progress, &cli);
+        QString reason;
+        const int result = device.CopyFileToPC(source, target, &Cli::progress, &cli, &reason);
         cli.endProgress();
         if (result)
-            return cli.gatewayFailure(QStringLiteral("copying %1 from the device").arg(source), result, &device);
+            return cli.gatewayFailure(QStringLiteral("copying %1 from the device").arg(source), result, reason);
         return ExitSuccess;
     });
 }
@@ -44,10 +46,11 @@ int push(Cli& cli, const QStringList& arguments)
         QString target = arguments.at(2);
         if (target.endsWith(QLatin1Char('/')))
             target += QFileInfo(source).fileName();
-        const int result = device.CopyFileToDevice(source, target, &Cli::progress, &cli);
+        QString reason;
+        const int result = device.CopyFileToDevice(source, target, &Cli::progress, &cli, &reason);
         cli.endProgress();
         if (result)
-            return cli.gatewayFailure(QStringLiteral("copying %1 to the device").arg(source), result, &device);
+            return cli.gatewayFailure(QStringLiteral("copying %1 to the device").arg(source), result, reason);
         return ExitSuccess;
     });
 }
@@ -56,8 +59,9 @@ int install(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
         QSet<VolumeInfo> found;
-        if (const int result = device.GetVolumes(found))
-            return cli.gatewayFailure(QStringLiteral("reading the volumes"), result, &device);
+        QString reason;
+        if (const int result = device.GetVolumes(found, &reason))
+            return cli.gatewayFailure(QStringLiteral("reading the volumes"), result, reason);
         // By default the first volume by mount point, the one the file system page starts with.
         QList<VolumeInfo> volumes(found.cbegin(), found.cend());
         std::sort(volumes.begin(), volumes.end(), [](const VolumeInfo& a, const VolumeInfo& b) { return a.mountPoint < b.mountPoint; });
@@ -68,10 +72,10 @@ int install(Cli& cli, const QStringList& arguments)
         if (chosen == volumes.cend())
             return cli.fail(ExitUsage, wanted.isEmpty() ? QStringLiteral("the device has no volume")
                                                         : QStringLiteral("the device has no volume %1").arg(wanted));
-        const int result = device.InstallPackage(arguments.at(1), quint16(chosen->volumeId));
+        const int result = device.InstallPackage(arguments.at(1), quint16(chosen->volumeId), &reason);
         if (result)
-            return cli.gatewayFailure(QStringLiteral("installing %1").arg(arguments.at(1)), result, &device);
-        std::fputs(qPrintable(device.statusText + QLatin1Char('\n')), stdout);
+            return cli.gatewayFailure(QStringLiteral("installing %1").arg(arguments.at(1)), result, reason);
+        std::fputs(qPrintable(reason + QLatin1Char('\n')), stdout);
         return ExitSuccess;
     });
 }
@@ -79,8 +83,9 @@ int install(Cli& cli, const QStringList& arguments)
 int run(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
-        if (const int result = device.RunApplication(arguments.at(1)))
-            return cli.gatewayFailure(QStringLiteral("running %1").arg(arguments.at(1)), result, &device);
+        QString reason;
+        if (const int result = device.RunApplication(arguments.at(1), &reason))
+            return cli.gatewayFailure(QStringLiteral("running %1").arg(arguments.at(1)), result, reason);
         return ExitSuccess;
     });
 }
@@ -88,8 +93,9 @@ int run(Cli& cli, const QStringList& arguments)
 int remove(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
-        if (const int result = device.DeleteDeviceFile(arguments.at(1)))
-            return cli.gatewayFailure(QStringLiteral("deleting %1").arg(arguments.at(1)), result, &device);
+        QString reason;
+        if (const int result = device.DeleteDeviceFile(arguments.at(1), &reason))
+            return cli.gatewayFailure(QStringLiteral("deleting %1").arg(arguments.at(1)), result, reason);
         return ExitSuccess;
     });
 }

@@ -29,8 +29,9 @@ int mifOfModule(Cli& cli, const QString& deviceName, const QString& module)
 {
     return cli.onDevice(deviceName, [&](_ZantDevice& device) {
         QVector<ModuleInfo> modules;
-        if (const int result = device.GetModules(modules, nullptr, nullptr))
-            return cli.gatewayFailure(QStringLiteral("reading the modules"), result, &device);
+        QString reason;
+        if (const int result = device.GetModules(modules, nullptr, nullptr, &reason))
+            return cli.gatewayFailure(QStringLiteral("reading the modules"), result, reason);
         QStringList paths;
         for (const ModuleInfo& known : std::as_const(modules)) {
             if (known.path == module) {
@@ -51,8 +52,8 @@ int mifOfModule(Cli& cli, const QString& deviceName, const QString& module)
                     .arg(module, paths.join(QStringLiteral(", "))));
         }
         MifEntry entry;
-        if (const int result = device.GetModuleMif(paths.first(), entry))
-            return cli.gatewayFailure(QStringLiteral("reading %1").arg(paths.first()), result, &device);
+        if (const int result = device.GetModuleMif(paths.first(), entry, &reason))
+            return cli.gatewayFailure(QStringLiteral("reading %1").arg(paths.first()), result, reason);
         return cli.emitReport(MifEntryReport::build(entry));
     });
 }
@@ -89,8 +90,7 @@ int compare(Cli& cli, const QStringList& arguments)
     for (const QString& path : arguments) {
         const PlatformScanFile file = PlatformScanFile::read(path);
         if (file.status == PlatformScanFile::Unreadable)
-            return cli.fail(
-                ExitGatewayError, QStringLiteral("cannot read %1: missing, unreadable or not XML").arg(path));
+            return cli.fail(ExitGatewayError, file.errorString);
         if (file.status == PlatformScanFile::WrongFormat)
             return cli.fail(ExitGatewayError,
                 QStringLiteral("%1 is not a platform scan: it has no class list").arg(path));

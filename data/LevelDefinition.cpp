@@ -3,8 +3,10 @@
 #include "IdFormat.h"
 #include "XmlReadPolicy.h"
 
-#include <QDomDocument>
+#include "XmlEscape.h"
+
 #include <QFile>
+#include <QXmlStreamReader>
 
 bool LevelDefinition::load(const QString& path)
 {
@@ -19,22 +21,39 @@ bool LevelDefinition::load(const QString& path)
 bool LevelDefinition::load(QIODevice* device)
 {
     XmlReadPolicy policy(XmlReadPolicy::DatabaseFileBytes);
-    QDomDocument document;
-    if (!policy.read(device, document)) {
+    QByteArray bytes;
+    if (!policy.readChecked(device, bytes)) {
         m_error = policy.errorString();
+        return false;
+    }
+    // Streamed: a DOM of a file at the policy's size limit would cost gigabytes.
+    QList<IdRecord> read;
+    QXmlStreamReader xml(bytes);
+    xml.setNamespaceProcessing(false);
+    int depth = 0;
+    while (!xml.atEnd()) {
+        const QXmlStreamReader::TokenType token = xml.readNext();
+        if (token == QXmlStreamReader::EndElement)
+            --depth;
+        if (token != QXmlStreamReader::StartElement || ++depth != 2 || xml.name() != u"Id")
+            continue;
+        IdRecord record;
+        record.id = normalizeIdText(XmlEscape::unescaped(xml.attributes().value(QLatin1String("value"))));
+        record.name = XmlEscape::unescaped(xml.attributes().value(QLatin1String("name")));
+        if (!record.id.isEmpty())
+            read.append(record);
+    }
+    if (xml.hasError()) {
+        const auto* file = qobject_cast<const QFileDevice*>(device);
+        m_error = QStringLiteral("%1 line %2: %3")
+                      .arg(file ? file->fileName() : QStringLiteral("XML input"))
+                      .arg(xml.lineNumber())
+                      .arg(xml.errorString());
         return false;
     }
     m_error.clear();
 
-    const QString idElement = QStringLiteral("Id");
-    const QDomElement root = document.documentElement();
-    for (QDomElement e = root.firstChildElement(idElement); !e.isNull(); e = e.nextSiblingElement(idElement)) {
-        IdRecord record;
-        record.id = normalizeIdText(e.attribute(QStringLiteral("value")));
-        record.name = e.attribute(QStringLiteral("name"));
-        if (record.id.isEmpty())
-            continue;
-
+    for (IdRecord record : std::as_const(read)) {
         if (m_idMap) {
             const IdRecord found = m_idMap->value(record.id);
             if (!found.name.isEmpty()) {

@@ -4,11 +4,15 @@
 #include "QBinaryStream.h"
 #include "QVectorStream.h"
 
+#include "RegularFile.h"
+
 #include <QFile>
 
 using namespace MifFormat;
 
 namespace {
+
+constexpr qint64 WholeReadLimit = 1024 * 1024;
 
 // Ids up to the first 0 or the end of the blob (a failed read yields 0).
 QVector<quint32> decodeIds(const QByteArray& blob)
@@ -80,15 +84,27 @@ QVector<MifMimeType> decodeMimeTypes(const QByteArray& blob, int count)
 
 bool MifReader::readFile(const QString& path)
 {
-    QFile file(path);
-    if (!file.open(QIODevice::ReadOnly))
-        return fail(QStringLiteral("Cannot open %1: %2").arg(path, file.errorString()));
+    clear();
+    QFile file;
+    QString error;
+    if (!RegularFile::open(file, path, &error))
+        return fail(error);
+    const qint64 size = file.size();
+    if (size > MaxFileSize)
+        return fail(QStringLiteral("%1 is larger than %2 bytes").arg(path).arg(MaxFileSize));
+    // A small file is read in one go and decoded in memory, which costs less than the
+    // stream's many small reads; a large one goes through the stream, which rejects a bad
+    // header without loading the rest.
+    if (size <= WholeReadLimit)
+        return readData(file.read(size));
     QBinaryStream in(&file);
-    return read(in, file.size());
+    return read(in, size);
 }
 
 bool MifReader::readData(const QByteArray& data)
 {
+    if (data.size() > MaxFileSize)
+        return fail(QStringLiteral("The data (%1 bytes) is larger than %2 bytes").arg(data.size()).arg(MaxFileSize));
     QVectorStream in(data);
     return read(in, data.size());
 }

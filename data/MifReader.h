@@ -15,8 +15,13 @@ class QStream;
 class MifReader
 {
 public:
+    // No module file comes near this; a larger one is refused before anything is read.
+    static constexpr qint64 MaxFileSize = 64 * 1024 * 1024;
+
     // False with errorString() when the file cannot be opened or the data is malformed;
-    // a failed read leaves no resources behind.
+    // a failed read leaves no resources behind. Only a regular file is read (a FIFO or a
+    // device, even through a link, is refused without waiting), and no further than the
+    // size it had when opened.
     bool readFile(const QString& path);
     bool readData(const QByteArray& data);
 

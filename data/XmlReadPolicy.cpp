@@ -82,6 +82,14 @@ bool XmlReadPolicy::readCheckedFile(const QString& path, QByteArray& xml)
     return readLimited(&file, path, xml) && check(xml, path);
 }
 
+bool XmlReadPolicy::readChecked(QIODevice* device, QByteArray& xml)
+{
+    m_error.clear();
+    const auto* file = qobject_cast<const QFileDevice*>(device);
+    const QString source = file ? file->fileName() : QStringLiteral("XML input");
+    return readLimited(device, source, xml) && check(xml, source);
+}
+
 bool XmlReadPolicy::check(const QByteArray& xml, const QString& source)
 {
     QXmlStreamReader reader(xml);

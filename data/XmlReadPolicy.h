@@ -36,6 +36,7 @@ public:
     // Reads and checks the file without parsing it, for readers that stream it themselves
     // (the DOM of a large file costs far more than reading it).
     bool readCheckedFile(const QString& path, QByteArray& xml);
+    bool readChecked(QIODevice* device, QByteArray& xml);
 
     QString errorString() const { return m_error; }
 

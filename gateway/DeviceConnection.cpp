@@ -65,6 +65,7 @@ qint32 DeviceConnection::download(Operation operation, const QByteArray& request
     if (result != 0)
         return result;
     const qint64 patience = deadline.remainingTime();
+    QDeadlineTimer working(patience * Protocol::StillWorkingLimit);
     QByteArray data(int(Protocol::TransferChunkSize), Qt::Uninitialized);
     for (;;) {
         char header[Protocol::HeaderSize];
@@ -85,10 +86,14 @@ qint32 DeviceConnection::download(Operation operation, const QByteArray& request
                 return result;
             if ((result = sink(data.constData(), size)) != 0)
                 return fail(result, QStringLiteral("The download was stopped on this side (%1)").arg(result));
+            working.setRemainingTime(patience * Protocol::StillWorkingLimit);
             continue;
         }
-        if (frame.flags & Protocol::StillWorking)
+        if (frame.flags & Protocol::StillWorking) {
+            if (working.hasExpired())
+                return fail(PortlexError::Timeout, QStringLiteral("The device kept working for %1 ms without sending").arg(patience * Protocol::StillWorkingLimit));
             continue;
+        }
         frame.payload.resize(size);
         if ((result = readExactly(frame.payload.data(), size, deadline)) != 0)
             return result;
@@ -275,8 +280,10 @@ qint32 DeviceConnection::send(Operation operation, const QByteArray& request, Pr
 
 qint32 DeviceConnection::receive(Operation operation, QByteArray* body, QDeadlineTimer deadline)
 {
-    // The caller's time is a limit on silence: each StillWorking notice grants it afresh.
+    // The caller's time is a limit on silence: each StillWorking notice grants it afresh,
+    // up to StillWorkingLimit times that time in all.
     const qint64 patience = deadline.remainingTime();
+    const QDeadlineTimer working(patience * Protocol::StillWorkingLimit);
     Frame frame;
     for (;;) {
         const FrameDecoder::Status status = m_decoder.next(&frame);
@@ -285,7 +292,9 @@ qint32 DeviceConnection::receive(Operation operation, QByteArray* body, QDeadlin
                 break;
             if (!answersPending(frame, operation))
                 return fail(PortlexError::ProtocolError, QStringLiteral("Notice does not match the request"));
-            deadline.setRemainingTime(patience);
+            if (working.hasExpired())
+                return fail(PortlexError::Timeout, QStringLiteral("The device kept working for %1 ms without answering").arg(patience * Protocol::StillWorkingLimit));
+            deadline.setRemainingTime(std::min(patience, working.remainingTime()));
             continue;
         }
         if (status == FrameDecoder::Status::Malformed)

@@ -2,16 +2,9 @@
 
 #include "MifReader.h"
 
-#include <QFile>
 #include <QFileInfo>
 
 #include <algorithm>
-
-namespace {
-
-constexpr qint64 WholeReadLimit = 1024 * 1024;
-
-} // namespace
 
 MifBatchReader::MifBatchReader(const QStringList& paths, int threadCount)
     : m_paths(paths)
@@ -79,15 +72,8 @@ bool MifBatchReader::readNext()
 
 bool MifBatchReader::readModule(const QString& path, MifEntry& entry)
 {
-    // A small file is read in one go and decoded in memory, which costs less than the file
-    // stream's many small reads; a large one goes through the stream, which rejects a bad
-    // header without loading the rest.
-    QFile file(path);
-    if (!file.open(QIODevice::ReadOnly | QIODevice::Unbuffered))
-        return false;
     MifReader reader;
-    const bool read = file.size() <= WholeReadLimit ? reader.readData(file.readAll()) : reader.readFile(path);
-    if (!read || !reader.decodeModule(entry))
+    if (!reader.readFile(path) || !reader.decodeModule(entry))
         return false;
     entry.fileName = QFileInfo(path).fileName();
     entry.filePath = path;

@@ -31,6 +31,12 @@ bool hasMifSuffix(const QString& fileName)
     return fileName.endsWith(QLatin1String(".mif"), Qt::CaseInsensitive);
 }
 
+bool isRegularFile(const QString& path)
+{
+    struct stat info;
+    return ::stat(QFile::encodeName(path).constData(), &info) == 0 && S_ISREG(info.st_mode);
+}
+
 } // namespace
 
 QStringList MifFileFinder::find(const QString& directory)
@@ -47,14 +53,15 @@ QStringList MifFileFinder::find(const QString& directory)
         FolderKey key;
         if (!folderKey(folder, key) || !entered.insert(key).second)
             continue;
-        // Regular files only (and links to them): a FIFO or device named *.mif would block.
+        // Regular files only, and links to them: Qt lets every link through the Files
+        // filter, and a link to a FIFO or a device named *.mif would block or never end.
         QDirIterator children(folder, QDir::Dirs | QDir::Files | QDir::Hidden | QDir::NoDotAndDotDot);
         QStringList subfolders;
         while (children.hasNext()) {
             children.next();
             if (children.fileInfo().isDir())
                 subfolders.append(children.filePath());
-            else if (hasMifSuffix(children.fileName()))
+            else if (hasMifSuffix(children.fileName()) && isRegularFile(children.filePath()))
                 files.append(children.filePath());
         }
         std::sort(subfolders.begin(), subfolders.end(), std::greater<QString>());

@@ -22,8 +22,6 @@ struct Gateway
 {
     QMutex mutex;
     QMap<QString, QSharedPointer<_ZantDevice>> devices;
-    unsigned lastError = 0;
-    QString lastStatus;
     QAtomicInt holders;
 };
 
@@ -31,13 +29,6 @@ Gateway& gateway()
 {
     static Gateway instance;
     return instance;
-}
-
-void setLastFailure(unsigned code, const QString& status)
-{
-    QMutexLocker lock(&gateway().mutex);
-    gateway().lastError = code;
-    gateway().lastStatus = status;
 }
 
 bool isSocket(const QString& path)
@@ -75,7 +66,6 @@ QVector<Found> probeSockets(const QStringList& socketPaths)
 
 bool Portlex::Initialize()
 {
-    setLastFailure(0, QString());
     return true;
 }
 
@@ -134,29 +124,15 @@ QSharedPointer<_ZantDevice> Portlex::GetDevice(const QString& id)
     return gateway().devices.value(id);
 }
 
-bool Portlex::ConnectDevice(const QSharedPointer<_ZantDevice>& device, const QString& user, const QString& password)
+bool Portlex::ConnectDevice(const QSharedPointer<_ZantDevice>& device, const QString& user, const QString& password,
+                            int* code, QString* reason)
 {
-    if (!device) {
-        setLastFailure(PortlexError::InvalidArgument, QStringLiteral("No device"));
-        return false;
-    }
-    int code = 0;
-    QString reason;
-    if (!device->attach(user, password, &code, &reason)) {
-        setLastFailure(unsigned(code), reason);
-        return false;
-    }
-    return true;
-}
-
-unsigned Portlex::LastError()
-{
-    QMutexLocker lock(&gateway().mutex);
-    return gateway().lastError;
-}
-
-QString Portlex::LastStatus()
-{
-    QMutexLocker lock(&gateway().mutex);
-    return gateway().lastStatus;
+    int result = PortlexError::InvalidArgument;
+    QString said = QStringLiteral("No device");
+    const bool connected = device && device->attach(user, password, &result, &said);
+    if (code)
+        *code = result;
+    if (reason)
+        *reason = said;
+    return connected;
 }

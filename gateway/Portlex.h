@@ -28,10 +28,11 @@ public:
     static unsigned GetDevices(QList<QPair<QString, QString>>& devices);
     // The device with that id as last listed by GetDevices; null if never listed.
     static QSharedPointer<_ZantDevice> GetDevice(const QString& id);
-    // Attaches to the device and fills its cache; on false see LastError and LastStatus.
-    static bool ConnectDevice(const QSharedPointer<_ZantDevice>& device, const QString& user, const QString& password);
-    static unsigned LastError();
-    static QString LastStatus();
+    // Attaches to the device and publishes a new cache. code (may be null) gets 0 or the
+    // failure's code, reason (may be null) the device's word on the connection: its
+    // greeting, or why it refused.
+    static bool ConnectDevice(const QSharedPointer<_ZantDevice>& device, const QString& user, const QString& password,
+                              int* code = nullptr, QString* reason = nullptr);
 
     // Reads every MIF file below directory (suffix "mif" in any case) into entries, ordered
     // by relative path; files that are not readable modules are skipped. callback (may be

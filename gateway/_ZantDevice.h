@@ -31,7 +31,10 @@
 // with a long request says so, and is waited for). After such a transport failure no
 // clean-up call follows: the device drops the connection's transfers with it. Results
 // are 0 for success, else a code from PortlexErrors.h or one the device chose; on
-// failure the output arguments are unchanged.
+// failure the output arguments are unchanged. Each call's reason (may be null) gets that
+// call's own explanation: the device's word when it said why it refused, or what went
+// wrong on the way; empty when there is none. Nothing about one call is kept on the
+// object, so threads never see each other's failures.
 class QFile;
 
 class _ZantDevice
@@ -43,69 +46,76 @@ public:
     _ZantDevice& operator=(const _ZantDevice&) = delete;
 
     QString name;          // display name, e.g. "Zantro Simulator - NAME"
-    // The device's last word on a connection or installation, or why it refused a request
-    // when it said so.
-    QString statusText;
     // Set to ask the device to leave the mode; sent with the next call, then cleared.
     std::atomic<bool> serviceLockRequest { false };
     std::atomic<bool> signatureLockRequest { false };
-    DeviceCache cache;     // filled by Portlex::ConnectDevice
 
     bool Connected() const { return m_connected; }
+    // What the device described at the last successful Portlex::ConnectDevice (empty and
+    // not filled before). Never changed once handed out: a new connect publishes a new
+    // record, so a holder reads its own copy while another thread connects again.
+    QSharedPointer<const DeviceCache> cache() const;
 
-    int GetModules(QVector<ModuleInfo>& modules, PortlexProgressCallback callback, void* context);
-    int GetModuleMif(const QString& modulePath, MifEntry& entry);
-    int GetLoadedModules(QVector<LoadedModuleInfo>& processes);
-    int GetProcesses(QVector<ProcessInfo>& processes);
-    int GetVolumes(QSet<VolumeInfo>& volumes);
-    int GetRegistry(QVector<RegistryInfo>& entries, PortlexProgressCallback callback, void* context);
+    int GetModules(QVector<ModuleInfo>& modules, PortlexProgressCallback callback, void* context, QString* reason = nullptr);
+    int GetModuleMif(const QString& modulePath, MifEntry& entry, QString* reason = nullptr);
+    int GetLoadedModules(QVector<LoadedModuleInfo>& processes, QString* reason = nullptr);
+    int GetProcesses(QVector<ProcessInfo>& processes, QString* reason = nullptr);
+    int GetVolumes(QSet<VolumeInfo>& volumes, QString* reason = nullptr);
+    int GetRegistry(QVector<RegistryInfo>& entries, PortlexProgressCallback callback, void* context, QString* reason = nullptr);
     // Fills the node whose path is set (SetPath) with its values and direct children.
-    int GetChildSettings(QSharedPointer<_SettingsInfo>& node);
+    int GetChildSettings(QSharedPointer<_SettingsInfo>& node, QString* reason = nullptr);
     // Fills level (made when null) with one directory level of the device.
     int GetFileSystemLevel(const QString& path, QSharedPointer<_DirectoryInfo>& level, PortlexProgressCallback callback,
-                           void* context);
-    int GetTepSigPrivs(QVector<PriviledgeRecord>& privileges);
+                           void* context, QString* reason = nullptr);
+    int GetTepSigPrivs(QVector<PriviledgeRecord>& privileges, QString* reason = nullptr);
     // 0 when enabled; fills the mode's name, its owner and its expiry text.
-    EnablementStatus TepStatus(QString& mode, QString& owner, QString& expiry);
-    EnablementStatus GlobalTestSigStatus(QString& mode, QString& owner, QString& expiry);
+    EnablementStatus TepStatus(QString& mode, QString& owner, QString& expiry, QString* reason = nullptr);
+    EnablementStatus GlobalTestSigStatus(QString& mode, QString& owner, QString& expiry, QString* reason = nullptr);
 
     // Transfers stream the file's bytes and land under a temporary name that is renamed
     // when complete: a failed, cut or cancelled copy leaves no partial file on either side.
     // callback (may be null) gets (-1, size in KiB) first, then (KiB done, size in KiB)
     // as the bytes move, on the calling thread; true from it stops the copy (Cancelled).
+    // The local file is written through SafeOutputFile: never through a link at its name,
+    // and never over anything but a regular file.
     int CopyFileToPC(const QString& devicePath, const QString& localPath, PortlexProgressCallback callback = nullptr,
-                     void* context = nullptr);
+                     void* context = nullptr, QString* reason = nullptr);
+    // Sends the size the file had when opened; bytes it gains meanwhile stay behind.
     int CopyFileToDevice(const QString& localPath, const QString& devicePath, PortlexProgressCallback callback = nullptr,
-                         void* context = nullptr);
-    // Sends a .zantro package to be extracted into the volume's install folder; statusText
-    // tells the outcome (why it was refused, on failure).
-    int InstallPackage(const QString& localPath, unsigned short volumeId);
+                         void* context = nullptr, QString* reason = nullptr);
+    // Sends a .zantro package to be extracted into the volume's install folder; reason
+    // gets the device's outcome text, on success too.
+    int InstallPackage(const QString& localPath, unsigned short volumeId, QString* reason = nullptr);
     // Starts the .mod file at devicePath as a process of the device.
-    int RunApplication(const QString& devicePath);
+    int RunApplication(const QString& devicePath, QString* reason = nullptr);
     // A file, a link (not what it names), or a directory with its contents.
-    int DeleteDeviceFile(const QString& devicePath);
+    int DeleteDeviceFile(const QString& devicePath, QString* reason = nullptr);
 
 private:
     friend class Portlex;
 
-    // Attaches to the device and fills the cache; false with the code and reason on failure.
+    // Attaches to the device and publishes a new cache; the code (0 on success) and the
+    // device's word on the connection (its greeting or refusal) in code and reason.
     bool attach(const QString& user, const QString& password, int* code, QString* reason);
     QString socketPath() const;
     void setSocketPath(const QString& socketPath);
 
-    // One request on the calling thread's connection, carrying pending lock requests.
-    int call(Operation operation, const QByteArray& request, QByteArray* body, QString* error = nullptr);
+    // One request on the calling thread's connection, carrying pending lock requests;
+    // reason as for the public calls.
+    int call(Operation operation, const QByteArray& request, QByteArray* body, QString* reason);
     // A call whose answer fields are read into fields when the result is 0.
     template <typename... Fields>
-    int query(Operation operation, const QByteArray& request, Fields&... fields);
-    EnablementStatus enablement(Operation operation, QString& mode, QString& owner, QString& expiry);
-    // Streams source into the open upload transferId; a failure ends the transfer on the
-    // device.
-    int upload(Operation operation, quint32 transferId, QFile& source, PortlexProgressCallback callback, void* context);
+    int query(Operation operation, const QByteArray& request, QString* reason, Fields&... fields);
+    EnablementStatus enablement(Operation operation, QString& mode, QString& owner, QString& expiry, QString* reason);
+    // Streams size bytes of source into the open upload transferId; a failure ends the
+    // transfer on the device.
+    int upload(Operation operation, quint32 transferId, QFile& source, quint64 size, PortlexProgressCallback callback,
+               void* context, QString* reason);
 
     mutable QMutex m_mutex;
     QString m_socketPath;
     QByteArray m_connectRequest;  // the accepted Connect, repeated on every new connection
+    QSharedPointer<const DeviceCache> m_cache;
     std::atomic<bool> m_connected { false };
     std::shared_ptr<int> m_lifetime;  // lets threads' connections notice that the device is gone
 };

@@ -32,7 +32,7 @@ ClassListView::ClassListView(QWidget* parent)
     m_pacer.armFirst(FirstTickMs);
 }
 
-void ClassListView::setDeviceRecord(DeviceCache* record)
+void ClassListView::setDeviceRecord(const DeviceCache* record)
 {
     m_record = record;
     if (!record || m_worker.exists())

@@ -28,7 +28,7 @@ public:
 
     // Starts the worker on record's classes (the record stays the device's); null, or a
     // second call, starts nothing.
-    void setDeviceRecord(DeviceCache* record);
+    void setDeviceRecord(const DeviceCache* record);
 
     const TickPacer& pacer() const;
     RecordTableModel* model() const;
@@ -53,7 +53,7 @@ signals:
 private:
     void finish();
 
-    DeviceCache* m_record = nullptr;
+    const DeviceCache* m_record = nullptr;
     RecordTableModel* m_model;
     QSharedPointer<PageFeed<IdRecord>> m_pending = QSharedPointer<PageFeed<IdRecord>>::create();
     TickPacer m_pacer{IdleStartMs, IdleCapMs};

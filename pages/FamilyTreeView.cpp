@@ -36,7 +36,7 @@ FamilyTreeView::FamilyTreeView(QWidget* parent)
     connect(&m_pacer, &TickPacer::timeout, this, &FamilyTreeView::onTimeElapse);
 }
 
-void FamilyTreeView::setDeviceRecord(DeviceCache* record)
+void FamilyTreeView::setDeviceRecord(const DeviceCache* record)
 {
     m_record = record;
     if (!record || m_worker.exists())

@@ -29,7 +29,7 @@ public:
 
     // Starts the worker on record's classes (the record stays the device's); null, or a
     // second call, starts nothing.
-    void setDeviceRecord(DeviceCache* record);
+    void setDeviceRecord(const DeviceCache* record);
 
     const TickPacer& pacer() const;
 
@@ -48,7 +48,7 @@ private:
     void placeClass(const IdRecord& record);
     void finish();
 
-    DeviceCache* m_record = nullptr;
+    const DeviceCache* m_record = nullptr;
     QSharedPointer<PageFeed<IdRecord>> m_pending = QSharedPointer<PageFeed<IdRecord>>::create();
     TickPacer m_pacer{IdleStartMs, IdleCapMs};
     FamilyGrouping m_grouping{nullptr}; // on _familyTree once the form is set up

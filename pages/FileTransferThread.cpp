@@ -63,10 +63,11 @@ void FileTransferThread::run()
     for (m_current = 0; m_current < m_jobs.size() && !m_cancel; ++m_current) {
         const Job& job = m_jobs.at(m_current);
         emit progress(m_current, m_doneBefore, QFileInfo(job.source).fileName());
-        const int result = transfer(job);
+        QString reason;
+        const int result = transfer(job, &reason);
         if (job.kind == Job::Install) {
             emit fileDone(result == 0 ? job.source + QStringLiteral(" installed.")
-                                      : QStringLiteral("Error intalling package %1: %2").arg(job.source, m_device->statusText));
+                                      : QStringLiteral("Error intalling package %1: %2").arg(job.source, reason));
         } else {
             emit fileDone(copyMessage(job.source, result));
         }
@@ -74,15 +75,15 @@ void FileTransferThread::run()
     }
 }
 
-int FileTransferThread::transfer(const Job& job)
+int FileTransferThread::transfer(const Job& job, QString* reason)
 {
     switch (job.kind) {
     case Job::ToDevice:
-        return m_device->CopyFileToDevice(job.source, job.target, &FileTransferThread::onProgress, this);
+        return m_device->CopyFileToDevice(job.source, job.target, &FileTransferThread::onProgress, this, reason);
     case Job::Install:
-        return m_device->InstallPackage(job.source, m_volumeId);
+        return m_device->InstallPackage(job.source, m_volumeId, reason);
     case Job::ToPC:
-        return m_device->CopyFileToPC(job.source, job.target, &FileTransferThread::onProgress, this);
+        return m_device->CopyFileToPC(job.source, job.target, &FileTransferThread::onProgress, this, reason);
     case Job::FolderToPC:
         break;
     }

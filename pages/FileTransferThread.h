@@ -57,7 +57,7 @@ private:
     // Replaces the folder jobs by the files below them, creating the local folders.
     void expandFolders();
     void expandFolder(const QString& devicePath, const QString& localFolder);
-    int transfer(const Job& job);
+    int transfer(const Job& job, QString* reason);
 
     QSharedPointer<_ZantDevice> m_device;
     QVector<Job> m_jobs;

@@ -66,7 +66,7 @@ LevelViewWidget::LevelViewWidget(QWidget* parent)
     connect(_levelDocuments, &QComboBox::currentIndexChanged, this, &LevelViewWidget::onCurrentLevelChanged);
 }
 
-void LevelViewWidget::setDeviceRecord(DeviceCache* record)
+void LevelViewWidget::setDeviceRecord(const DeviceCache* record)
 {
     QStringList files;
     if (record)
@@ -74,7 +74,7 @@ void LevelViewWidget::setDeviceRecord(DeviceCache* record)
     offerLevelFiles(record, files);
 }
 
-void LevelViewWidget::setDeviceRecord(DeviceCache* record, const QString& levelsDirectory)
+void LevelViewWidget::setDeviceRecord(const DeviceCache* record, const QString& levelsDirectory)
 {
     QStringList files;
     if (record)
@@ -82,7 +82,7 @@ void LevelViewWidget::setDeviceRecord(DeviceCache* record, const QString& levels
     offerLevelFiles(record, files);
 }
 
-void LevelViewWidget::offerLevelFiles(DeviceCache* record, QStringList files)
+void LevelViewWidget::offerLevelFiles(const DeviceCache* record, QStringList files)
 {
     m_record = record;
     if (!record)

@@ -23,8 +23,8 @@ public:
     // Offers the level files for record's device (the record stays the device's), sorted by
     // name; null offers nothing. The files are those of the "Levels" folder beside the
     // program, or of levelsDirectory.
-    void setDeviceRecord(DeviceCache* record);
-    void setDeviceRecord(DeviceCache* record, const QString& levelsDirectory);
+    void setDeviceRecord(const DeviceCache* record);
+    void setDeviceRecord(const DeviceCache* record, const QString& levelsDirectory);
 
 public slots:
     QString componentName() override;
@@ -40,11 +40,11 @@ public slots:
 private:
     struct LevelRead;
 
-    void offerLevelFiles(DeviceCache* record, QStringList files);
+    void offerLevelFiles(const DeviceCache* record, QStringList files);
     static std::shared_ptr<LevelRead> read(const QString& path, const IdRecordMap& classes);
     void showLevel(LevelRead& level);
 
-    DeviceCache* m_record = nullptr;
+    const DeviceCache* m_record = nullptr;
     QString m_report;
     quint64 m_request = 0;
 };

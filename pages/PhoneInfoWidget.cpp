@@ -16,7 +16,7 @@ PhoneInfoWidget::PhoneInfoWidget(QWidget* parent)
         table->horizontalHeader()->setSortIndicator(0, Qt::AscendingOrder);
 }
 
-void PhoneInfoWidget::setDeviceRecord(DeviceCache* record)
+void PhoneInfoWidget::setDeviceRecord(const DeviceCache* record)
 {
     m_record = record;
     if (!record)

@@ -17,7 +17,7 @@ public:
     explicit PhoneInfoWidget(QWidget* parent = nullptr);
 
     // Fills the page from record (owned by the device object); null leaves it as it is.
-    void setDeviceRecord(DeviceCache* record);
+    void setDeviceRecord(const DeviceCache* record);
 
 public slots:
     QString componentName() override;
@@ -31,5 +31,5 @@ public slots:
 private:
     static void fillFormats(QTableWidget* table, const QMap<QString, QString>& formats);
 
-    DeviceCache* m_record = nullptr;
+    const DeviceCache* m_record = nullptr;
 };

@@ -24,13 +24,14 @@
 // Every answer payload starts with `qint32 result` (0 = success, else a code from
 // PortlexErrors.h or one the device chooses); the fields listed under "answer" follow the
 // result and are present when the result is 0 unless stated otherwise. A failure may
-// instead carry a QString saying why (a refused path, a read-only folder); the client keeps
-// it as the device's status text.
+// instead carry a QString saying why (a refused path, a read-only folder); the client hands
+// it to the caller as that call's reason. An answer too large for a frame is Refused with
+// such a text.
 //
 // Still working: while a request takes long, the device may send any number of frames
 // with the StillWorking flag, the request's id and operation and an empty payload before
-// the answer. Each one restarts the client's timeout for that request; only silence
-// times out.
+// the answer. Each one restarts the client's timeout for that request, up to
+// StillWorkingLimit call timeouts in all; then the call times out.
 //
 // Back-pressure: a device reads no further requests from a connection while answers it
 // has not yet handed to the kernel exceed a few chunks; a client that does not read its
@@ -152,6 +153,10 @@ constexpr quint32 MaxRequestSize = TransferChunkSize + 64 * 1024;
 
 // Every gateway call completes or fails after this long without a frame from the device.
 constexpr int CallTimeoutMs = 5000;
+// StillWorking notices renew a call's timeout, but not for ever: a device that keeps
+// saying so for this many call timeouts in a row (without answering, or without data in a
+// stream) has the call fail with Timeout. 60 x 5 s: five minutes, beyond any install.
+constexpr int StillWorkingLimit = 60;
 // Discovery asks every socket for its identity within this time, all at once.
 constexpr int DiscoveryTimeoutMs = 500;
 // A device drops a connection that stays without a handshake, or with a frame only

@@ -318,7 +318,11 @@ void ServerConnection::send(const Frame& request, qint32 result, const QByteArra
     PayloadStream out(&answer.payload);
     if (quint32(body.size()) > Protocol::MaxPayloadSize - sizeof(qint32)) {
         qWarning("Answer to %s exceeds the frame limit", qPrintable(Protocol::operationName(Operation(request.operation))));
-        out << qint32(PortlexError::IoError);
+        // Refused with why, so that the user reads more than a bare code.
+        out << qint32(PortlexError::Refused)
+            << QStringLiteral("The answer (%1 bytes) is larger than the frame limit of %2 bytes")
+                   .arg(body.size())
+                   .arg(Protocol::MaxPayloadSize);
     } else {
         out << result;
         out.writeRawData(body.constData(), int(body.size()));

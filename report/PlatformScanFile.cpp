@@ -1,6 +1,7 @@
 #include "PlatformScanFile.h"
 
 #include "IdFormat.h"
+#include "XmlEscape.h"
 #include "XmlReadPolicy.h"
 
 #include <QFileInfo>
@@ -22,8 +23,10 @@ PlatformScanFile PlatformScanFile::read(const QString& path)
     PlatformScanFile file;
     QByteArray bytes;
     XmlReadPolicy policy(XmlReadPolicy::DatabaseFileBytes);
-    if (!policy.readCheckedFile(path, bytes))
+    if (!policy.readCheckedFile(path, bytes)) {
+        file.errorString = policy.errorString();
         return file;
+    }
 
     // Streamed, not a DOM: the entries of each kind of container below the root, kept apart
     // since "classes" counts only in a file without "ZantHeaderDataList".
@@ -56,20 +59,22 @@ PlatformScanFile PlatformScanFile::read(const QString& path)
                 kind = Classes;
             } else if (name == u"ZTOVERSION" && !versionRead) {
                 versionRead = true;
-                file.header = attributes.value(QLatin1String("version")).toString();
+                file.header = XmlEscape::unescaped(attributes.value(QLatin1String("version")));
             } else if (name == u"ZTOId" && open.last() != None) {
-                listed[open.last()].append({attributes.value(QLatin1String("name")).toString(),
-                    comparableId(attributes.value(QLatin1String("value")).toString()),
-                    attributes.value(QLatin1String("family")).toString(),
-                    attributes.value(QLatin1String("subfamily")).toString()});
+                listed[open.last()].append({XmlEscape::unescaped(attributes.value(QLatin1String("name"))),
+                    comparableId(XmlEscape::unescaped(attributes.value(QLatin1String("value")))),
+                    XmlEscape::unescaped(attributes.value(QLatin1String("family"))),
+                    XmlEscape::unescaped(attributes.value(QLatin1String("subfamily")))});
             }
         }
         if (kind != None)
             found[kind] = true;
         open.append(kind);
     }
-    if (xml.hasError())
+    if (xml.hasError()) {
+        file.errorString = QStringLiteral("%1 line %2: %3").arg(path).arg(xml.lineNumber()).arg(xml.errorString());
         return file;
+    }
 
     if (file.header.isEmpty())
         file.header = QFileInfo(path).baseName();

@@ -24,6 +24,8 @@ struct PlatformScanFile
     };
 
     Status status = Unreadable;
+    // Why the file is Unreadable, naming it: the policy's or the parser's own words.
+    QString errorString;
     // The first "ZTOVERSION"'s "version", or the file's base name when that is empty.
     QString header;
     QVector<Entry> entries;

@@ -1,6 +1,7 @@
 #include "Report.h"
 
 #include "SortKey.h"
+#include "XmlEscape.h"
 #include "XmlReport.h"
 
 #include <QJsonArray>
@@ -15,7 +16,7 @@ void writeXml(QXmlStreamWriter& xml, const ReportNode& node)
 {
     xml.writeStartElement(node.element);
     for (const auto& attribute : node.attributes)
-        xml.writeAttribute(attribute.first, attribute.second);
+        xml.writeAttribute(attribute.first, XmlEscape::escaped(attribute.second));
     for (const ReportNode& child : node.children)
         writeXml(xml, child);
     xml.writeEndElement();

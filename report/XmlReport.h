@@ -5,7 +5,8 @@
 
 // A page's export document: the document type declaration, then the elements indented by
 // one space per level, every value an attribute, no XML declaration. Attributes come out
-// in the order they are written; a DOM document would shuffle them on every run.
+// in the order they are written; a DOM document would shuffle them on every run. Every
+// value is written through XmlEscape, whose rule keeps characters XML cannot carry.
 class XmlReport
 {
 public:

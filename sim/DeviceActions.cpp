@@ -3,6 +3,7 @@
 #include "DeviceState.h"
 #include "PackageInstaller.h"
 #include "PortlexErrors.h"
+#include "RegularFile.h"
 
 #include <QDir>
 #include <QFileInfo>
@@ -99,8 +100,11 @@ quint64 DeviceActions::roomLeft(int volume)
 void DeviceActions::sweepLeftovers()
 {
     int removed = 0;
-    for (int volume = 0; volume < m_state.resolver().mountCount(); ++volume)
+    for (int volume = 0; volume < m_state.resolver().mountCount(); ++volume) {
+        // An install a kill cut short is rolled back before its staging folder goes.
+        removed += PackageInstaller::recover(m_state.resolver().rootFolder(volume));
         removed += TransferTable::sweep(m_state.resolver().rootFolder(volume));
+    }
     if (removed > 0)
         m_state.filesChanged();
 }
@@ -123,8 +127,9 @@ Answer DeviceActions::copyToPCBegin(const Request& request)
     TransferTable::Transfer transfer;
     transfer.connectionId = request.connectionId;
     transfer.kind = TransferTable::Kind::Download;
-    transfer.file = std::make_unique<QFile>(target.localPath);
-    if (!transfer.file->open(QIODevice::ReadOnly))
+    // Regular files only: opening a FIFO would block the whole device.
+    transfer.file = std::make_unique<QFile>();
+    if (!RegularFile::open(*transfer.file, target.localPath))
         return Answer::failure(PortlexError::IoError);
     transfer.size = quint64(transfer.file->size());
     transfer.volume = target.volume;

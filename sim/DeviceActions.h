@@ -37,7 +37,8 @@ public:
     qint64 readStream(quint64 connectionId, quint32 id, char* data, qint64 max);
     qint32 writeStream(quint64 connectionId, quint32 id, const char* data, qint64 size);
 
-    // Removes the temporary files and folders that a crash left in the volumes.
+    // Rolls back the installs a kill cut short, then removes the temporary files and
+    // folders that a crash left in the volumes.
     void sweepLeftovers();
 
 private:

@@ -280,10 +280,16 @@ bool DeviceState::touchesSystemFolder(const QString& localPath) const
     for (int v = 0; v < m_profile.volumes.size() && v < m_resolver.mountCount(); ++v) {
         const VolumeSpec& spec = m_profile.volumes.at(v);
         for (const QString& folder : spec.moduleFolders) {
+            if (folder == spec.installFolder)
+                continue;
+            // A declared system folder that does not exist yet is no less the system's:
+            // a client must not create it and plant modules there.
             VolumePathResolver::Target system;
-            if (folder == spec.installFolder
-                || m_resolver.resolveExisting(VolumePathResolver::joinDevicePath(m_resolver.mountPoint(v), folder), system)
-                    != VolumePathResolver::Status::Ok)
+            const VolumePathResolver::Status found
+                = m_resolver.resolveExisting(VolumePathResolver::joinDevicePath(m_resolver.mountPoint(v), folder), system);
+            if (found == VolumePathResolver::Status::NotFound)
+                system.localPath = QDir::cleanPath(m_resolver.rootFolder(v) + QLatin1Char('/') + folder);
+            else if (found != VolumePathResolver::Status::Ok)
                 continue;
             if (within(system.localPath, localPath) || within(localPath, system.localPath))
                 return true;

@@ -62,6 +62,11 @@ bool ImageCopy::copyTree(const QString& source, const QString& target, QString* 
             if (!copyTree(entry.filePath(), to, error))
                 return false;
         } else if (entry.isFile()) {
+            // A file nobody may read is left out, as a device serves the rest of its volume.
+            if (!QFileInfo(entry.filePath()).isReadable()) {
+                qWarning("%s is not readable: left out of the copy", qPrintable(entry.filePath()));
+                continue;
+            }
             if (!copyFile(entry.filePath(), to)) {
                 *error = QStringLiteral("cannot copy %1").arg(entry.filePath());
                 return false;

@@ -3,6 +3,7 @@
 #include "IdFormat.h"
 #include "MifReader.h"
 #include "NameDatabases.h"
+#include "RegularFile.h"
 #include "VolumePathResolver.h"
 
 #include <QDir>
@@ -172,8 +173,8 @@ void ModuleCatalog::scanFolder(const QString& localFolder, const QString& device
             fileSize(mifPath) + fileSize(base + QStringLiteral(".mod")) + fileSize(base + QStringLiteral(".inf")),
             0xffffffff));
 
-        QFile sidecar(base + QStringLiteral(".inf"));
-        if (!QFileInfo(sidecar.fileName()).isSymLink() && sidecar.open(QIODevice::ReadOnly))
+        QFile sidecar;
+        if (!QFileInfo(base + QStringLiteral(".inf")).isSymLink() && RegularFile::open(sidecar, base + QStringLiteral(".inf")))
             readSidecar(sidecar.read(MaxSidecarSize), module.info);
 
         const QByteArray stamp = fileStamp(mifPath);

@@ -47,8 +47,9 @@ bool SimulatorDaemon::start(const SimOptions& options)
     }
 
     const QString namesDir = options.namesDir.isEmpty() ? QCoreApplication::applicationDirPath() : options.namesDir;
+    // Errors name the image the user gave, not its temporary copy.
     if (!m_state.load(imageDir, namesDir))
-        return fail(m_state.errorString());
+        return fail(m_copy ? m_state.errorString().replace(m_copy->path(), options.imageDir) : m_state.errorString());
     m_servedImage = imageDir;
     if (!options.deviceId.isEmpty())
         m_state.setId(options.deviceId);

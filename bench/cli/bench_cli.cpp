@@ -177,7 +177,7 @@ int main(int argc, char** argv)
     const QSharedPointer<_ZantDevice> device = serveGeneratedDevice(server, work, modules, classes);
     if (!device)
         return 1;
-    out() << QStringLiteral("image: %1 modules, %2 classes\n").arg(modules).arg(device->cache.classes.size());
+    out() << QStringLiteral("image: %1 modules, %2 classes\n").arg(modules).arg(device->cache()->classes.size());
 
     const QString outputPath = work.filePath(QStringLiteral("output"));
     benchCommand(QStringLiteral("modules"), runs, outputPath);

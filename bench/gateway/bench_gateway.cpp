@@ -145,8 +145,9 @@ int main(int argc, char** argv)
     QList<QPair<QString, QString>> devices;
     Portlex::GetDevices(devices);
     const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(QStringLiteral("bench"));
-    if (!device || !Portlex::ConnectDevice(device, QString(), QString()))
-        qFatal("cannot connect: %s", qPrintable(Portlex::LastStatus()));
+    QString reason;
+    if (!device || !Portlex::ConnectDevice(device, QString(), QString(), nullptr, &reason))
+        qFatal("cannot connect: %s", qPrintable(reason));
 
     QString mode, owner, expiry;
     device->TepStatus(mode, owner, expiry);

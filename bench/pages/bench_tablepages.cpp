@@ -363,7 +363,7 @@ int main(int argc, char** argv)
         return 1;
     }
     out() << QStringLiteral("image: %1 modules, %2 classes, %3 registry entries; median of %4 runs\n")
-                 .arg(modules).arg(device->cache.classes.size()).arg(entries).arg(runs);
+                 .arg(modules).arg(device->cache()->classes.size()).arg(entries).arg(runs);
 
     const QList<Page> pages = {
         {QStringLiteral("module list"), QStringLiteral("modules"), [](DeviceWindow& w) { return w.action_Modules; },
@@ -379,8 +379,8 @@ int main(int argc, char** argv)
     for (const Page& page : pages)
         benchPage(page, runs);
 
-    const Gaps once = classFill(device->cache, classes, runs);
-    const Gaps fourTimes = classFill(device->cache, classes * 4, runs);
+    const Gaps once = classFill(*device->cache(), classes, runs);
+    const Gaps fourTimes = classFill(*device->cache(), classes * 4, runs);
     out() << QStringLiteral("class id page alone: %1 classes ready after %2 ms (%3);\n  %4 classes after %5 ms (%6);\n"
                             "  ratio %7 (target <= 4.5)\n")
                  .arg(classes).arg(once.ms).arg(gapText(once))

@@ -244,7 +244,7 @@ QTreeWidgetItem* largestNode(QTreeWidget* tree)
 
 // The family tree of device, runs times: its time to "Ready" and gaps, the statuses it
 // showed; the last page stays for what follows.
-QVector<Gaps> familyTreeRuns(DeviceCache* record, int runs, std::unique_ptr<FamilyTreeView>& kept, QStringList& statuses)
+QVector<Gaps> familyTreeRuns(const DeviceCache* record, int runs, std::unique_ptr<FamilyTreeView>& kept, QStringList& statuses)
 {
     QVector<Gaps> results;
     for (int run = 0; run < runs; ++run) {
@@ -286,11 +286,11 @@ int main(int argc, char** argv)
     if (!device)
         return 1;
     out() << QStringLiteral("image: %1 modules, %2 classes, %3 settings nodes; peak memory before the pages: %4 MB\n")
-                 .arg(modules).arg(device->cache.classes.size()).arg(settings).arg(peakMemoryMb());
+                 .arg(modules).arg(device->cache()->classes.size()).arg(settings).arg(peakMemoryMb());
 
     std::unique_ptr<FamilyTreeView> family;
     QStringList statuses;
-    const QVector<Gaps> familyFills = familyTreeRuns(&device->cache, runs, family, statuses);
+    const QVector<Gaps> familyFills = familyTreeRuns(device->cache().data(), runs, family, statuses);
     const qint64 familyMs = median(readyTimes(familyFills));
     out() << QStringLiteral("family tree: ready after %1 ms (median of %2; target <= 1000 ms), delvix-cli family-tree %3 ms\n")
                  .arg(familyMs).arg(runs).arg(cliMs(QStringLiteral("family-tree"), DeviceId, runs));
@@ -349,9 +349,9 @@ int main(int argc, char** argv)
         LevelViewWidget page;
         page.resize(900, 600);
         page.show();
-        page.setDeviceRecord(&device->cache);
+        page.setDeviceRecord(device->cache().data());
         const QString fullLevel = work.filePath(QStringLiteral("Everything.xml"));
-        if (!writeFullLevel(fullLevel, device->cache.classes)) {
+        if (!writeFullLevel(fullLevel, device->cache()->classes)) {
             std::fprintf(stderr, "cannot write %s\n", qPrintable(fullLevel));
             return 1;
         }
@@ -377,11 +377,11 @@ int main(int argc, char** argv)
         const QSharedPointer<_ZantDevice> large = serveGeneratedDevice(largeServer, work, modules, classes * scale, 0, largeId);
         if (!large)
             return 1;
-        const QVector<Gaps> largeFills = familyTreeRuns(&large->cache, runs, family, statuses);
+        const QVector<Gaps> largeFills = familyTreeRuns(large->cache().data(), runs, family, statuses);
         family.reset();
         const qint64 largeMs = median(readyTimes(largeFills));
         out() << QStringLiteral("family tree at %1 classes: ready after %2 ms, %3x the time at %4 (target <= 4.5x)\n")
-                     .arg(large->cache.classes.size()).arg(largeMs)
+                     .arg(large->cache()->classes.size()).arg(largeMs)
                      .arg(double(largeMs) / double(std::max<qint64>(1, familyMs)), 0, 'f', 2).arg(classes);
         printGaps(QStringLiteral("during the fill"), largeFills);
         largeServer.terminate();

@@ -19,7 +19,9 @@ double medianMs(QVector<qint64> nanoseconds)
     return nanoseconds.at(nanoseconds.size() / 2) / 1e6;
 }
 
-double timeRequest(SimRequestHandler& handler, Operation operation, const QByteArray& payload, int runs, int& bytes)
+// The answer's size, or -1 with its result when the device refused.
+double timeRequest(SimRequestHandler& handler, Operation operation, const QByteArray& payload, int runs, int& bytes,
+                   qint32& result)
 {
     Request request;
     request.operation = operation;
@@ -30,7 +32,8 @@ double timeRequest(SimRequestHandler& handler, Operation operation, const QByteA
         timer.start();
         const Answer answer = handler.handle(request);
         times.append(timer.nsecsElapsed());
-        bytes = int(answer.body.size());
+        result = answer.result;
+        bytes = answer.result == 0 ? int(answer.body.size()) : -1;
     }
     return medianMs(times);
 }
@@ -68,7 +71,17 @@ int main(int argc, char* argv[])
     out << "load the image: " << timer.elapsed() << " ms\n";
 
     SimRequestHandler handler(state);
+    // The device serves a connection only after it accepted a Connect on it.
+    Request connect;
+    connect.operation = Operation::Connect;
+    PayloadStream credentials(&connect.payload);
+    credentials << QString() << QString();
+    if (const Answer accepted = handler.handle(connect); accepted.result != 0) {
+        out << "Connect refused: " << accepted.result << "\n";
+        return 1;
+    }
     int bytes = 0;
+    qint32 result = 0;
     QByteArray bulk;
     PayloadStream path(&bulk);
     path << QStringLiteral("/shared/bulk");
@@ -84,8 +97,11 @@ int main(int argc, char* argv[])
         {"GetFileSystemLevel /shared/bulk", Operation::GetFileSystemLevel, bulk},
     };
     for (const auto& r : requests) {
-        const double ms = timeRequest(handler, r.operation, r.payload, 9, bytes);
-        out << r.name << ": median " << QString::number(ms, 'f', 2) << " ms, " << bytes << " bytes\n";
+        const double ms = timeRequest(handler, r.operation, r.payload, 9, bytes, result);
+        if (bytes < 0)
+            out << r.name << ": refused with " << result << "\n";
+        else
+            out << r.name << ": median " << QString::number(ms, 'f', 2) << " ms, " << bytes << " bytes\n";
     }
     return 0;
 }

@@ -3,12 +3,16 @@
 #include "ProcessReport.h"
 #include "SimulatorProcess.h"
 #include "TestSupport.h"
+#include "XmlEscape.h"
 #include "_ZantDevice.h"
 
 #include <QJsonArray>
 #include <QJsonDocument>
 #include <QTemporaryDir>
 #include <QtTest>
+
+#include <sys/stat.h>
+#include <sys/sysmacros.h>
 
 using namespace TestSupport;
 
@@ -142,6 +146,56 @@ private slots:
         QVERIFY(!csv({"processes", "kestrel"}).filter(QRegularExpression("^demo,")).isEmpty());
         QCOMPARE(runCli({"rm", "kestrel", "/usermod/demo"}).exitCode, 0);
         QCOMPARE(csv({"ls", "kestrel", "/usermod"}).filter("/usermod/demo"), QStringList());
+    }
+
+    // pull and -o write neither through a link at the target (another user may have planted
+    // it in a shared folder) nor over a FIFO or a device node; the refusal says why.
+    void outputsOnlyReplaceRegularFiles()
+    {
+        QVERIFY(writeFile(local("victim.txt"), "precious") && QDir().mkpath(local("shared")));
+        QVERIFY(QFile::link(local("victim.txt"), local("shared/shopping.txt")) && QFile::link(local("victim.txt"), local("shared/report.xml")));
+        QVERIFY(::mkfifo(QFile::encodeName(local("shared/pipe")).constData(), 0600) == 0);
+        const bool root = ::geteuid() == 0;
+        if (root)
+            QVERIFY(::mknod(QFile::encodeName(local("shared/null")).constData(), S_IFCHR | 0666, makedev(1, 3)) == 0);
+        const QList<QPair<QStringList, QByteArray>> refused {
+            {{"pull", "kestrel", "/user/notes/shopping.txt", local("shared")}, "symbolic link"},
+            {{"-o", local("shared/report.xml"), "devices"}, "symbolic link"},
+            {{"-o", local("shared/pipe"), "devices"}, "not a regular file"},
+            {{"pull", "kestrel", "/user/notes/shopping.txt", local(root ? "shared/null" : "shared/pipe")}, "not a regular file"},
+        };
+        for (const auto& [arguments, reason] : refused) {
+            const CliRun run = runCli(arguments);
+            QVERIFY2(run.exitCode == 4 && run.err.contains(reason), run.err.constData());
+        }
+        QCOMPARE(readFile(local("victim.txt")), QByteArray("precious"));
+        QVERIFY(QFileInfo(local("shared/shopping.txt")).isSymLink() && QFileInfo(local("shared/report.xml")).isSymLink());
+        // Nothing left behind: no temporary file beside the targets.
+        QCOMPARE(QDir(local("shared")).entryList(QDir::AllEntries | QDir::Hidden | QDir::System | QDir::NoDotAndDotDot).size(), root ? 4 : 3);
+        struct stat info;
+        QVERIFY(::lstat(QFile::encodeName(local("shared/pipe")).constData(), &info) == 0 && S_ISFIFO(info.st_mode));
+        QVERIFY(!root || (::lstat(QFile::encodeName(local("shared/null")).constData(), &info) == 0 && S_ISCHR(info.st_mode)));
+        // A regular file is replaced, keeping its permissions.
+        QVERIFY(writeFile(local("shared/kept.xml"), "old") && QFile::setPermissions(local("shared/kept.xml"), QFile::ReadOwner | QFile::WriteOwner));
+        QCOMPARE(runCli({"-o", local("shared/kept.xml"), "devices"}).exitCode, 0);
+        QVERIFY(readFile(local("shared/kept.xml")).startsWith("<!DOCTYPE"));
+        QVERIFY(::lstat(QFile::encodeName(local("shared/kept.xml")).constData(), &info) == 0 && (info.st_mode & 0777) == 0600);
+    }
+
+    // A name with a character XML cannot carry is listed in its escaped form, which our
+    // rule turns back into the name of that very file.
+    void escapedNamesNameTheirFile()
+    {
+        const QString name = QStringLiteral("fffe") + QChar(0xFFFE) + QStringLiteral(".txt");
+        QVERIFY(writeFile(local("odd.txt"), "odd one") && writeFile(local("plain.txt"), "plain one"));
+        QCOMPARE(m_device->CopyFileToDevice(local("odd.txt"), "/user/" + name), 0);
+        QCOMPARE(m_device->CopyFileToDevice(local("plain.txt"), "/user/fffe.txt"), 0);
+        const QByteArray listing = runCli({"ls", "kestrel", "/user"}).out;
+        QVERIFY2(listing.contains("path=\"/user/fffe{U+FFFE}.txt\""), listing.constData());
+        QCOMPARE(XmlEscape::unescaped(u"/user/fffe{U+FFFE}.txt"), "/user/" + name);
+        QCOMPARE(runCli({"pull", "kestrel", XmlEscape::unescaped(u"/user/fffe{U+FFFE}.txt"), local("back.txt")}).exitCode, 0);
+        QCOMPARE(readFile(local("back.txt")), QByteArray("odd one"));
+        QCOMPARE(m_device->DeleteDeviceFile("/user/" + name) + m_device->DeleteDeviceFile("/user/fffe.txt"), 0);
     }
 
     // A device that stops answering once the copy began: the call times out.

@@ -94,7 +94,7 @@ private slots:
     {
         for (const QString& device : m_devices.keys()) {
             const QJsonArray rows = classRows(runCli({"classes", device}).out);
-            QCOMPARE(rows.size(), m_devices.value(device)->cache.classes.size());
+            QCOMPARE(rows.size(), m_devices.value(device)->cache()->classes.size());
             const QJsonObject json = QJsonDocument::fromJson(runCli({"--format", "json", "classes", device}).out).object();
             QCOMPARE(json.value("ZantHeaderDataList").toArray().at(0).toObject().value("ZTOId").toArray(), rows);
             const QList<QByteArray> lines = runCli({"--format=csv", "classes", device}).out.trimmed().split('\n');
@@ -133,7 +133,7 @@ private:
     // The export of the page that shows command's data for device, once it is complete.
     QString pageExport(const QString& command, const QString& device)
     {
-        DeviceCache* cache = &m_devices.value(device)->cache;
+        const DeviceCache* cache = m_devices.value(device)->cache().data();
         const auto started = [&device](GatewayComponentWidget& page) { page.startComponent(device); };
         const auto recorded = [cache](auto& page) { page.setDeviceRecord(cache); };
         if (command == "modules")

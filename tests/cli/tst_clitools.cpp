@@ -2,12 +2,16 @@
 #include "ModuleInfoDialog.h"
 #include "PlatformClassIDDialog.h"
 #include "PlatformComparisonView.h"
+#include "PlatformScanFile.h"
+#include "PlatformScanReport.h"
 #include "Portlex.h"
 #include "SimulatorProcess.h"
 #include "TestSupport.h"
 
 #include <QTemporaryDir>
 #include <QtTest>
+
+#include <sys/stat.h>
 
 // The device-less tools and a device module's MIF entry on the command line, compared with
 // what their windows save: the module information, the platform scan and the comparison.
@@ -37,6 +41,12 @@ private slots:
         QVERIFY(TestSupport::writeFile(work("other.xml"), "<!DOCTYPE platform-scan>\n<ZTOINFO/>\n"));
         QVERIFY(TestSupport::writeFile(work("garbage.mif"), "not a resource container"));
         QVERIFY(QDir(m_work.path()).mkpath("empty") && QDir::setCurrent(m_work.path()));
+        // Scans the policy refuses, each for a reason of its own.
+        QVERIFY(TestSupport::writeFile(work("dtd.xml"), "<!DOCTYPE s [<!ENTITY a \"b\">]><ZTOINFO/>"));
+        QVERIFY(TestSupport::writeFile(work("deep.xml"), QByteArray("<a>").repeated(70) + QByteArray("</a>").repeated(70)));
+        // A folder whose MIF names lead to what is no file: scanning it must neither wait nor read for ever.
+        QVERIFY(QDir(m_work.path()).mkpath("devices") && ::mkfifo(QFile::encodeName(work("fifo")).constData(), 0600) == 0);
+        QVERIFY(QFile::link("/dev/zero", work("devices/zero.mif")) && QFile::link(work("fifo"), work("devices/pipe.mif")));
     }
 
     // A MIF file on this computer, or a device's module by its name or its path.
@@ -110,6 +120,9 @@ private slots:
         QTest::addColumn<QStringList>("arguments");
         QTest::addColumn<QString>("named");
         QTest::newRow("unreadable scan") << QStringList {"compare", "missing.xml", "large.xml"} << "missing";
+        QTest::newRow("scan with a DTD") << QStringList {"compare", "large.xml", "dtd.xml"} << "dtd.xml: a DTD is not accepted";
+        QTest::newRow("scan nested too deep") << QStringList {"compare", "deep.xml", "large.xml"} << "deep.xml: nesting deeper than 64 levels";
+        QTest::newRow("MIF links to a device and a FIFO") << QStringList {"scan", "devices"} << "no module information file below devices";
         QTest::newRow("scan without classes") << QStringList {"compare", "large.xml", "other.xml"} << "other";
         QTest::newRow("not a MIF file") << QStringList {"mif", "garbage.mif"} << "garbage.mif";
         QTest::newRow("module the device lacks") << QStringList {"mif", "kestrel:nothing"} << "\"nothing\"";
@@ -119,10 +132,24 @@ private slots:
     {
         QFETCH(QStringList, arguments);
         QFETCH(QString, named);
-        const CliRun run = runCli(arguments);
+        const CliRun run = runCli(arguments, 20000);
         QCOMPARE(run.exitCode, 4);
         QVERIFY2(run.err.contains(named.toUtf8()), run.err.constData());
         QCOMPARE(run.out, QByteArray());
+    }
+
+    // Names with characters XML cannot carry come back from a written scan as they were.
+    void escapedScanNamesReadBack()
+    {
+        const QString odd = QStringLiteral("ctl\x01" "a {U+0041} ") + QChar(0xFFFE) + QChar(0xD800);
+        const QVector<QStringList> rows {{odd, "0x01011001", "Family\x1b", "Sub", "/a.mif"}, {"ctla", "0x01011002", "F", "S", "/b.mif"}};
+        QVERIFY(TestSupport::writeFile(work("odd.xml"), PlatformScanReport::build(rows).write(Report::Format::Xml)));
+        const PlatformScanFile file = PlatformScanFile::read(work("odd.xml"));
+        QCOMPARE(file.status, PlatformScanFile::Read);
+        QCOMPARE(file.entries.size(), 2);
+        QCOMPARE(file.entries.at(0).name, odd);
+        QCOMPARE(file.entries.at(0).family, QStringLiteral("Family\x1b"));
+        QCOMPARE(file.entries.at(1).name, QStringLiteral("ctla"));
     }
 };
 

@@ -81,9 +81,10 @@ QSharedPointer<_ZantDevice> SimulatorProcess::connectDevice(const QString& image
     QList<QPair<QString, QString>> devices;
     Portlex::GetDevices(devices);
     QSharedPointer<_ZantDevice> device = Portlex::GetDevice(id);
-    if (device && Portlex::ConnectDevice(device, QString(), QString()))
+    QString reason;
+    if (device && Portlex::ConnectDevice(device, QString(), QString(), nullptr, &reason))
         return device;
-    qWarning("connecting %s failed: %s", qPrintable(id), qPrintable(Portlex::LastStatus()));
+    qWarning("connecting %s failed: %s", qPrintable(id), qPrintable(reason));
     return {};
 }
 

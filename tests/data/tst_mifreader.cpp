@@ -10,6 +10,8 @@
 #include <QtEndian>
 #include <QtTest>
 
+#include <sys/stat.h>
+
 using namespace MifFormat;
 
 Q_DECLARE_METATYPE(MifEntry)
@@ -137,6 +139,20 @@ private slots:
         QVERIFY(decoded == richEntry());
         QVERIFY(!reader.readFile(dir.filePath("missing.mif")) && reader.errorString().contains("missing.mif"));
         QVERIFY(!MifWriter::writeModuleFile(dir.filePath("no/such/folder/module.mif"), richEntry(), &error) && !error.isEmpty());
+
+        // What is not a regular file is refused at once, also behind a link: a FIFO would
+        // block the open, a device never end. A file past the limit is refused unread.
+        QVERIFY(::mkfifo(QFile::encodeName(dir.filePath("fifo.mif")).constData(), 0600) == 0);
+        QVERIFY(QFile::link("/dev/zero", dir.filePath("zero.mif")) && QFile::link(dir.filePath("fifo.mif"), dir.filePath("pipe.mif")));
+        for (const char* name : {"fifo.mif", "zero.mif", "pipe.mif"}) {
+            QVERIFY(!reader.readFile(dir.filePath(name)));
+            QCOMPARE(reader.errorString(), dir.filePath(name) + " is not a regular file");
+        }
+        QFile sparse(dir.filePath("sparse.mif"));
+        QVERIFY(sparse.open(QIODevice::WriteOnly) && sparse.write(twoBlobFile()) > 0 && sparse.resize(MifReader::MaxFileSize + 1));
+        sparse.close();
+        QVERIFY(!reader.readFile(sparse.fileName()));
+        QCOMPARE(reader.errorString(), QStringLiteral("%1 is larger than %2 bytes").arg(sparse.fileName()).arg(MifReader::MaxFileSize));
     }
 
     void containerLookups()

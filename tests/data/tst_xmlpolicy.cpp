@@ -4,6 +4,7 @@
 #include "LevelDefinition.h"
 #include "NameDatabases.h"
 #include "TestSupport.h"
+#include "XmlEscape.h"
 #include "XmlReadPolicy.h"
 
 #ifdef DELVIX_WITH_SIM
@@ -135,6 +136,33 @@ private slots:
         QVERIFY(writePadded(path, open, close, maxBytes + 1));
         QCOMPARE(readAs(reader, path, error), -1);
         QCOMPARE(error, QStringLiteral("%1: larger than %2 bytes").arg(path).arg(maxBytes));
+    }
+
+    // The escape rule for what XML cannot carry: written out, then undone exactly; a level
+    // file read back gives the names as they were before the rule.
+    void escapeRule_data()
+    {
+        QTest::addColumn<QString>("text");
+        QTest::addColumn<QString>("written");
+        QTest::newRow("plain") << "plain { U+ {U+" << "plain { U+ {U+007B}U+";
+        QTest::newRow("controls") << "ctl\x01" "a\x1b[31m" << "ctl{U+0001}a{U+001B}[31m";
+        QTest::newRow("non-characters") << QString("fffe") + QChar(0xFFFE) + QChar(0xFFFF) << "fffe{U+FFFE}{U+FFFF}";
+        QTest::newRow("lone surrogates") << QString(QChar(0xDC00)) + "x" + QChar(0xD800) << "{U+DC00}x{U+D800}";
+        QTest::newRow("a pair is carried") << QString::fromUtf8("\xF0\x9F\x98\x80") << QString::fromUtf8("\xF0\x9F\x98\x80");
+        QTest::newRow("the rule's own form") << "{U+0041}" << "{U+007B}U+0041}";
+    }
+    void escapeRule()
+    {
+        QFETCH(QString, text);
+        QFETCH(QString, written);
+        QCOMPARE(XmlEscape::escaped(text), written);
+        QCOMPARE(XmlEscape::unescaped(written), text);
+        QTemporaryDir dir;
+        QVERIFY(TestSupport::writeFile(dir.filePath("level.xml"),
+                                       "<level><Id value=\"0x01011001\" name=\"" + written.toHtmlEscaped().toUtf8() + "\"/></level>"));
+        LevelDefinition level;
+        QVERIFY2(level.load(dir.filePath("level.xml")), qPrintable(level.errorString()));
+        QCOMPARE(level.records().value(0).name, text);
     }
 };
 

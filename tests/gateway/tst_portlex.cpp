@@ -129,8 +129,10 @@ private slots:
         QVERIFY(makeStaleSocket(m_sockets->filePath(QStringLiteral("crashed.sock"))));
         QVERIFY(writeFile(m_sockets->filePath(QStringLiteral("notes.txt")), "note"));
         QCOMPARE(Portlex::GetDevices(devices), 0u);
-        QVERIFY(!Portlex::ConnectDevice(QSharedPointer<_ZantDevice>(), QString(), QString()));
-        QCOMPARE(Portlex::LastError(), unsigned(PortlexError::InvalidArgument));
+        int code = 0;
+        QString reason;
+        QVERIFY(!Portlex::ConnectDevice(QSharedPointer<_ZantDevice>(), QString(), QString(), &code, &reason));
+        QCOMPARE(code, int(PortlexError::InvalidArgument));
 
         SimulatorProcess first(m_sockets->path()), refusing(m_sockets->path());
         QVERIFY2(first.start(m_image->path(), QStringLiteral("dev-a")), qPrintable(first.errorString()));
@@ -142,10 +144,10 @@ private slots:
         QVERIFY(Portlex::GetDevice(QStringLiteral("nobody")).isNull());
         const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(QStringLiteral("dev-b"));
         QVERIFY(device && device->name == Name);
-        QVERIFY(!Portlex::ConnectDevice(device, QString(), QString()));
-        QCOMPARE(Portlex::LastError(), 77u);
-        QCOMPARE(Portlex::LastStatus(), QStringLiteral("Handset locked by operator"));
-        QVERIFY(!device->Connected() && !device->cache.filled);
+        QVERIFY(!Portlex::ConnectDevice(device, QString(), QString(), &code, &reason));
+        QCOMPARE(code, 77);
+        QCOMPARE(reason, QStringLiteral("Handset locked by operator"));
+        QVERIFY(!device->Connected() && !device->cache()->filled);
         QVector<ModuleInfo> modules;
         QCOMPARE(device->GetModules(modules, nullptr, nullptr), int(PortlexError::NotConnected));
     }
@@ -156,9 +158,9 @@ private slots:
     {
         const QSharedPointer<_ZantDevice> device
             = serve(LargeVolume, { QStringLiteral("--fail"), QStringLiteral("GetChildSettings:/appinfo=0xDEADBEEF") });
-        QVERIFY(device && device->Connected() && device->cache.filled);
-        QCOMPARE(device->cache.deviceData.phoneName, QStringLiteral("Test Phone"));
-        QVERIFY(device->cache.classes.contains(QStringLiteral("0x01011001")));
+        QVERIFY(device && device->Connected() && device->cache()->filled);
+        QCOMPARE(device->cache()->deviceData.phoneName, QStringLiteral("Test Phone"));
+        QVERIFY(device->cache()->classes.contains(QStringLiteral("0x01011001")));
 
         QVector<ModuleInfo> modules;
         QVERIFY(device->GetModules(modules, nullptr, nullptr) == 0
@@ -270,15 +272,17 @@ private slots:
         }
 
         // Install updates modules, registry and classes; installing again replaces the module.
-        QVERIFY(!device->cache.classes.value(QStringLiteral("0x01011002")).available);
+        const QSharedPointer<const DeviceCache> before = device->cache();
+        QVERIFY(!before->classes.value(QStringLiteral("0x01011002")).available);
         const QString tuner = local(QStringLiteral("tuner"));
         QString error;
         QVERIFY(SampleBuilder::writeModule(tuner, TestImage::module(QStringLiteral("tuner"), { 0x01011002 },
                                                                     { { 0x01011002, 0x01011001, QStringLiteral("audio/x-tuner") } }), &error)
                 && PackageWriter::pack(tuner, local(QStringLiteral("tuner.zantro")), &error));
 
-        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 1), 0);
-        QCOMPARE(device->statusText, QStringLiteral("Package tuner.zantro installed"));
+        QString reason;
+        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 1, &reason), 0);
+        QCOMPARE(reason, QStringLiteral("Package tuner.zantro installed"));
         QCOMPARE(readFile(flash(QStringLiteral("usermod/tuner/tuner.mif"))), readFile(tuner + QStringLiteral("/tuner.mif")));
         QCOMPARE(leftovers(flash()), QStringList());
         QVector<ModuleInfo> modules;
@@ -287,15 +291,17 @@ private slots:
         QVector<RegistryInfo> registry;
         QVERIFY(device->GetRegistry(registry, nullptr, nullptr) == 0
                 && anyHas(registry, &RegistryInfo::mimeType, QStringLiteral("audio/x-tuner")));
+        // A new connect publishes a new record; the one held before stays as it was.
         QVERIFY(Portlex::ConnectDevice(device, QString(), QString()));
-        QVERIFY(device->cache.classes.value(QStringLiteral("0x01011002")).available);
+        QVERIFY(device->cache()->classes.value(QStringLiteral("0x01011002")).available);
+        QVERIFY(!before->classes.value(QStringLiteral("0x01011002")).available);
 
         // Installing again replaces the module rather than failing or doubling it.
         QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 1), 0);
         QCOMPARE(device->GetModules(modules, nullptr, nullptr), 0);
         QCOMPARE(std::count_if(modules.cbegin(), modules.cend(), [](const ModuleInfo& m) { return m.name == QLatin1String("tuner"); }), 1);
-        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 9), int(PortlexError::NotFound));
-        QVERIFY(device->statusText.contains(QLatin1String("no volume 9")));
+        QCOMPARE(device->InstallPackage(local(QStringLiteral("tuner.zantro")), 9, &reason), int(PortlexError::NotFound));
+        QVERIFY2(reason.contains(QLatin1String("no volume 9")), qPrintable(reason));
     }
 
     // Two threads copy at once on one device without mixing.
@@ -409,10 +415,11 @@ private slots:
         const QByteArray unpacked = treeDigest(flash());
         QVector<ModuleInfo> modulesBefore, modulesAfter;
         QCOMPARE(device->GetModules(modulesBefore, nullptr, nullptr), 0);
-        QCOMPARE(device->InstallPackage(large, 1), int(PortlexError::NoSpace));
-        QVERIFY2(device->statusText.contains(QLatin1String("bytes free")), qPrintable(device->statusText));
-        QCOMPARE(device->InstallPackage(unpacksLarge, 1), int(PortlexError::Refused));
-        QVERIFY2(device->statusText.contains(QLatin1String("more room")), qPrintable(device->statusText));
+        QString reason;
+        QCOMPARE(device->InstallPackage(large, 1, &reason), int(PortlexError::NoSpace));
+        QVERIFY2(reason.contains(QLatin1String("bytes free")), qPrintable(reason));
+        QCOMPARE(device->InstallPackage(unpacksLarge, 1, &reason), int(PortlexError::Refused));
+        QVERIFY2(reason.contains(QLatin1String("more room")), qPrintable(reason));
         QCOMPARE(treeDigest(flash()), unpacked);
         QCOMPARE(device->GetModules(modulesAfter, nullptr, nullptr), 0);
         QCOMPARE(modulesAfter, modulesBefore);

@@ -36,7 +36,8 @@ constexpr quint32 TransferId = 7;
 enum Place { Missing, Folder, Link, Foreign, FileLink, StaleSocket, ForeignPeer };
 
 // The device: GetVolumes answers 7, GetRegistry fails with 3, a download streams streamSize
-// bytes, every stream hangs at its piece hangAtChunk, RunApplication works long.
+// bytes, every stream hangs at its piece hangAtChunk, RunApplication works long; its
+// settings root and its folder /user name themselves (or their parent) as a child.
 class Handler : public RequestHandler
 {
 public:
@@ -55,6 +56,17 @@ public:
             return Answer::failure(3);
         case Operation::GetCache:
             return Answer::success(DeviceCache());
+        case Operation::GetChildSettings: {
+            _SettingsInfo root(QStringLiteral("/"), QStringLiteral("/"));
+            root.children.append(QSharedPointer<_SettingsInfo>::create(QStringLiteral("a"), QStringLiteral("/a")));
+            root.children.append(QSharedPointer<_SettingsInfo>::create(QString(), QStringLiteral("/")));
+            return Answer::success(root);
+        }
+        case Operation::GetFileSystemLevel: {
+            _DirectoryInfo user(QStringLiteral("user"), QStringLiteral("/user"));
+            user.directories.append(QSharedPointer<_DirectoryInfo>::create(QStringLiteral(".."), QStringLiteral("/user/..")));
+            return Answer::success(user);
+        }
         case Operation::CopyToPCBegin:
             transferConnection = request.connectionId;
             return Answer::success(TransferId, streamSize.load());
@@ -525,6 +537,37 @@ private slots:
             QCOMPARE(call(m_socketPath, Operation::GetVolumes), 0);
             QVERIFY2(device.handler.lastConnection == device.handler.transferConnection + 1, action);
         }
+    }
+
+    // A device whose tree names an ancestor as a child would send every walk round for
+    // ever: the gateway refuses such an answer and says why.
+    void cyclicTreesRefused()
+    {
+        Device device(m_socketPath);
+        QList<QPair<QString, QString>> devices;
+        QCOMPARE(Portlex::GetDevices(devices), 1u);
+        const QSharedPointer<_ZantDevice> zant = Portlex::GetDevice(QStringLiteral("bench-1"));
+        QVERIFY(Portlex::ConnectDevice(zant, QString(), QString()));
+        auto node = QSharedPointer<_SettingsInfo>::create(QString(), QStringLiteral("/"));
+        QString reason;
+        QCOMPARE(zant->GetChildSettings(node, &reason), int(PortlexError::ProtocolError));
+        QCOMPARE(reason, QStringLiteral("The device named / as a child of /"));
+        QSharedPointer<_DirectoryInfo> level;
+        QCOMPARE(zant->GetFileSystemLevel(QStringLiteral("/user"), level, nullptr, nullptr, &reason), int(PortlexError::ProtocolError));
+        QCOMPARE(reason, QStringLiteral("The device named /user/.. as a child of /user"));
+        QVERIFY(node->children.isEmpty() && !level);
+    }
+
+    // A request of exactly the largest size is served (one byte more: badClientClosedAlone);
+    // the client does not even send a larger one.
+    void requestOfTheMaximumSize()
+    {
+        Device device(m_socketPath);
+        DeviceConnection connection(m_socketPath);
+        QByteArray body;
+        QCOMPARE(connection.call(Operation::GetVolumes, QByteArray(Protocol::MaxRequestSize, 'r'), Protocol::NoFlags, &body, QDeadlineTimer(5000)), 0);
+        QCOMPARE(connection.call(Operation::GetVolumes, QByteArray(Protocol::MaxRequestSize + 1, 'r'), Protocol::NoFlags, &body, QDeadlineTimer(5000)),
+                 qint32(PortlexError::InvalidArgument));
     }
 
     // The call allows 400 ms of silence: notices all through 800 ms of work keep it going

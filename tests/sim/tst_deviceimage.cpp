@@ -1,4 +1,5 @@
 #include "DeviceProfileParser.h"
+#include "PackageInstaller.h"
 #include "PackageWriter.h"
 #include "PortlexErrors.h"
 #include "ProcessTable.h"
@@ -11,6 +12,8 @@
 
 #include <algorithm>
 #include <functional>
+
+#include <sys/stat.h>
 
 namespace {
 
@@ -408,6 +411,48 @@ private slots:
         QString mode, owner, expires;
         QCOMPARE(state().tepStatus(mode, owner, expires), EnablementEnabled); // the lock request was not applied
         QCOMPARE(handle(Operation::GetVolumes, {}, 2).result, 0); // a refusal is no one else's
+    }
+
+    // FIFOs in an image, where the daemon would block on them for good: a sidecar at load
+    // and a file asked for by name are passed over, and the device answers on.
+    void fifosDoNotBlock()
+    {
+        QVERIFY(QDir().mkpath(flash("usermod/fifoinf")) && QFile::copy(flash("usermod/userm/userm.mif"), flash("usermod/fifoinf/fifoinf.mif")));
+        for (const char* fifo : {"usermod/fifoinf/fifoinf.inf", "user/pipe.txt"})
+            QVERIFY(::mkfifo(QFile::encodeName(flash(fifo)).constData(), 0600) == 0);
+        QVERIFY(m_image->load());
+        const QVector<ModuleInfo> modules = state().modules();
+        QVERIFY(std::any_of(modules.cbegin(), modules.cend(), [](const ModuleInfo& m) { return m.path == "/usermod/fifoinf/fifoinf.mif"; }));
+        QCOMPARE(act(Operation::CopyToPCBegin, pack(QStringLiteral("/user/pipe.txt"))).result, qint32(PortlexError::IoError));
+        QVERIFY(handle(Operation::Connect).result == 0 && handle(Operation::GetVolumes).result == 0);
+    }
+
+    // An install killed before, between or after any of its renames leaves, once the device
+    // starts again, either the whole old set or the whole new one; never a mix, never a
+    // module lost.
+    void installSurvivesAKillAtEveryStep()
+    {
+        const auto version = [this](const QString& name) {
+            return QFileInfo::exists(flash("usermod/" + name + "/v")) ? TestSupport::readFile(flash("usermod/" + name + "/v")) : QByteArray();
+        };
+        const QString first = writePackage([](PackageWriter& w) { w.addFile("a/v", "old a"), w.addFile("b/v", "old b"); });
+        const QString second = writePackage([](PackageWriter& w) { w.addFile("a/v", "new a"), w.addFile("b/v", "new b"), w.addFile("c/v", "new c"); });
+        QCOMPARE(install(first).result, 0);
+        // Two renames a name, then the end of the switch: steps 0 to 6; at 7 it runs through.
+        for (int kill = 0; kill <= 7; ++kill) {
+            PackageInstaller::faultHook = [kill](int step) { return step == kill; };
+            const qint32 result = install(second).result;
+            PackageInstaller::faultHook = nullptr;
+            QVERIFY(m_image->load());
+            m_image->handler().actions().sweepLeftovers();
+            const bool done = kill == 7 && result == 0;
+            QCOMPARE(version("a") + '|' + version("b") + '|' + version("c"),
+                     done ? QByteArray("new a|new b|new c") : QByteArray("old a|old b|"));
+            QCOMPARE(QDir(flash("usermod")).entryList(QDir::AllEntries | QDir::Hidden | QDir::NoDotAndDotDot).filter(".zantro"), QStringList());
+        }
+        // The recovery found nothing of a finished install to undo.
+        QCOMPARE(install(second).result, 0);
+        QCOMPARE(version("c"), QByteArray("new c"));
     }
 
     // The extractor's heartbeats reach the keep-alive of the device's request, for large
