@@ -5,7 +5,6 @@
 #include "LockStatusWidget.h"
 #include "ModuleInfoDialog.h"
 #include "Portlex.h"
-#include "PrivateTempFolder.h"
 #include "SaveXmlReport.h"
 #include "SecuritySettingsDialog.h"
 
@@ -13,7 +12,6 @@
 #include <QCloseEvent>
 #include <QCoreApplication>
 #include <QDesktopServices>
-#include <QDir>
 #include <QFileInfo>
 #include <QLabel>
 #include <QLineEdit>
@@ -251,7 +249,7 @@ void DeviceWindow::onToolbarActionTriggered(QAction* triggerAction)
     if (m_currentPage == _moduleListView)
         connect(_moduleListView, &ModuleListView::doubleClick, this, &DeviceWindow::onModuleInfoExamine);
     if (m_currentPage == _deviceFSView)
-        connect(_deviceFSView, &DeviceFileSystemView::doubleClick, this, &DeviceWindow::onFileSystemDoubleClick);
+        connect(_deviceFSView, &DeviceFileSystemView::localCopyReady, this, &DeviceWindow::onLocalCopyReady);
     attachCurrentPage();
     if (!m_currentPage) {
         onComponentStateChange(GatewayComponentWidget::Starting);
@@ -336,21 +334,8 @@ void DeviceWindow::onWriteXMLFile()
         saveXmlReport(this, m_currentPage->componentName(), report);
 }
 
-void DeviceWindow::onFileSystemDoubleClick(QString path)
+void DeviceWindow::onLocalCopyReady(QString local)
 {
-    const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(m_deviceId);
-    const QString fileName = QFileInfo(path).fileName();
-    // A name like ".." would make the copy land outside the temporary folder.
-    if (!device || fileName.isEmpty() || fileName == "." || fileName == "..")
-        return;
-    // Not the shared temporary folder itself: another user could plant a file or a link there
-    // under the name the copy is about to take.
-    const QString folder = privateTempFolder(QDir::tempPath());
-    if (folder.isEmpty())
-        return;
-    const QString local = folder + QLatin1Char('/') + fileName;
-    if (device->CopyFileToPC(path, local) != 0)
-        return;
     // A module's information file opens in the module information window, not on the desktop.
     const QFileInfo copied(local);
     if (copied.completeSuffix().compare(QLatin1String("mif"), Qt::CaseInsensitive) == 0) {

@@ -37,7 +37,8 @@ public:
 public slots:
     void SetStatus(QString statusString);
     void SetTimedStatus(QString statusMessage);
-    void onFileSystemDoubleClick(QString path);
+    // Opens a device file's copy on this computer (a module's information file in its window).
+    void onLocalCopyReady(QString local);
     void onComponentStateChange(GatewayComponentWidget::ComponentState state);
     void onSearch(QString searchChars);
     void onToolbarActionTriggered(QAction* triggerAction);

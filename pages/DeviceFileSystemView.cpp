@@ -1,52 +1,25 @@
 #include "DeviceFileSystemView.h"
 
 #include "CITreeWidgetItem.h"
+#include "DragOutWatcher.h"
 #include "FormatSize.h"
 #include "Portlex.h"
+#include "PrivateTempFolder.h"
+#include "TransferPlan.h"
 #include "WinVolumeMonitor.h"
 #include "_ZantDevice.h"
 
-#include <QDir>
-#include <QFutureWatcher>
-#include <QtConcurrent/QtConcurrentRun>
-#include <QFile>
 #include <QFileInfo>
+#include <QFutureWatcher>
 #include <QHeaderView>
 #include <QMessageBox>
 #include <QProgressDialog>
+#include <QPushButton>
+#include <QtConcurrent/QtConcurrentRun>
 
 #include <algorithm>
 
 namespace {
-
-// Never the mount point of a real volume: selecting with it always loads.
-const QString FirstVolume = QStringLiteral("Start with first");
-
-// Gathers the plain files below folder (no hidden or system entries, no links) and
-// returns their total size.
-quint64 gatherFolder(const QString& folder, QStringList& files)
-{
-    quint64 total = 0;
-    const QFileInfoList entries = QDir(folder).entryInfoList(
-        QDir::Files | QDir::Dirs | QDir::NoDotAndDotDot | QDir::NoSymLinks, QDir::NoSort);
-    for (const QFileInfo& entry : entries) {
-        if (entry.isDir()) {
-            total += gatherFolder(entry.absoluteFilePath(), files);
-        } else {
-            total += quint64(entry.size());
-            files.append(entry.absoluteFilePath());
-        }
-    }
-    return total;
-}
-
-// target and a remainder joined by exactly one "/".
-QString joinDevicePath(const QString& target, QString remainder)
-{
-    while (remainder.startsWith(QLatin1Char('/')))
-        remainder.remove(0, 1);
-    return target.endsWith(QLatin1Char('/')) ? target + remainder : target + QLatin1Char('/') + remainder;
-}
 
 int kib(quint64 bytes)
 {
@@ -62,15 +35,12 @@ DeviceFileSystemView::DeviceFileSystemView(QWidget* parent)
 {
     setStatus(QStringLiteral("Starting"));
     setupUi(this);
+    _volumeChooserLabel->hide();
+    _volumeChooser->hide();
+    connect(_volumeChooser, &QComboBox::activated, this,
+            [this](int index) { selectVolume(_volumeChooser->itemData(index).toString()); });
     connect(_fsTree, &ZantFSTreeWidget::RunTriggered, this, &DeviceFileSystemView::OnRunTriggered);
     connect(_fsTree, &ZantFSTreeWidget::DeleteTriggered, this, &DeviceFileSystemView::OnDeleteTriggered);
-    if (!_fsTree->anchorPath().isEmpty()) {
-        m_dragTimer.setSingleShot(true);
-        connect(&m_dragTimer, &QTimer::timeout, this, &DeviceFileSystemView::on__dragTimerExpired);
-        connect(_fsTree, &ZantFSTreeWidget::SourceDropStart, this, &DeviceFileSystemView::on__draggingStart);
-        connect(_fsTree, &ZantFSTreeWidget::SourceDropEnd, this, &DeviceFileSystemView::on__draggingEnd);
-        connect(_fsTree, &ZantFSTreeWidget::SourceDropCancelled, this, &DeviceFileSystemView::on__draggingCancelled);
-    }
     // The tree sorts when its header is clicked, not after every insertion: a sorting tree
     // sorts itself whole after each one, which a crawl of thousands of levels cannot afford.
     // Levels come in already sorted by name.
@@ -86,7 +56,6 @@ DeviceFileSystemView::DeviceFileSystemView(QWidget* parent)
 
 DeviceFileSystemView::~DeviceFileSystemView()
 {
-    stopWatchers();
     releaseTransfer();
 }
 
@@ -120,7 +89,15 @@ void DeviceFileSystemView::startComponent(const QString& deviceId)
         return;
     selectVolume(QString());
     m_worker.start(new DeviceFileSystemViewThread(this, m_device, m_crawl), QThread::NormalPriority);
-    startWatchers();
+    if (_fsTree->anchorPath().isEmpty())
+        return;
+    m_dragOut = std::make_unique<DragOutWatcher>(_fsTree->anchorPath(), WinVolumeMonitor::localDrives());
+    connect(_fsTree, &ZantFSTreeWidget::SourceDropStart, m_dragOut.get(), &DragOutWatcher::dragStarted);
+    connect(_fsTree, &ZantFSTreeWidget::SourceDropEnd, m_dragOut.get(), &DragOutWatcher::dragEnded);
+    connect(_fsTree, &ZantFSTreeWidget::SourceDropCancelled, m_dragOut.get(), &DragOutWatcher::dragCancelled);
+    connect(m_dragOut.get(), &DragOutWatcher::dropFolderFound, this, &DeviceFileSystemView::onDropFolderFound);
+    connect(m_dragOut.get(), &DragOutWatcher::dropNotRecognized, this,
+            [this] { emit timedStatusChanged(QStringLiteral("Drop target not recognized")); });
 }
 
 bool DeviceFileSystemView::canSearch()
@@ -151,28 +128,28 @@ QString DeviceFileSystemView::xmlReport()
 
 void DeviceFileSystemView::selectVolume(const QString& mountPoint)
 {
-    if (!m_device)
+    if (!m_device || (!m_volume.mountPoint.isEmpty() && m_volume.mountPoint == mountPoint))
         return;
-    if (mountPoint.isEmpty())
-        m_volume.mountPoint = FirstVolume;
-    if (m_volume.mountPoint == mountPoint)
-        return;
-    // Without updates the view skips working out what each removal would repaint.
-    _fsTree->setUpdatesEnabled(false);
-    _fsTree->clear();
-    _fsTree->setUpdatesEnabled(true);
-    m_itemsByPath.clear();
-    // What the crawl brings for the tree just cleared is dropped.
-    m_crawl->restart(QString());
-    setStatus(QStringLiteral("Processing File System..."));
+    loadVolume(mountPoint, false);
+}
 
+void DeviceFileSystemView::refresh()
+{
+    if (m_device)
+        loadVolume(m_volume.mountPoint, true);
+}
+
+void DeviceFileSystemView::loadVolume(const QString& mountPoint, bool keepView)
+{
+    setStatus(QStringLiteral("Processing File System..."));
     // The device may take long to count its free space: the GUI thread does not wait for it.
+    // The tree stays as it is until the answer comes.
     const quint64 request = ++m_volumeRequest;
     auto* answer = new QFutureWatcher<QPair<int, QSet<VolumeInfo>>>(this);
-    connect(answer, &QFutureWatcherBase::finished, this, [this, answer, request, mountPoint] {
+    connect(answer, &QFutureWatcherBase::finished, this, [this, answer, request, mountPoint, keepView] {
         answer->deleteLater();
         if (request == m_volumeRequest)
-            showVolume(answer->result().first, answer->result().second, mountPoint);
+            showVolume(answer->result().first, answer->result().second, mountPoint, keepView);
     });
     answer->setFuture(QtConcurrent::run([device = m_device] {
         QSet<VolumeInfo> volumes;
@@ -181,26 +158,50 @@ void DeviceFileSystemView::selectVolume(const QString& mountPoint)
     }));
 }
 
-void DeviceFileSystemView::showVolume(int result, const QSet<VolumeInfo>& volumes, const QString& mountPoint)
+void DeviceFileSystemView::showVolume(int result, const QSet<VolumeInfo>& volumes, const QString& mountPoint, bool keepView)
 {
-    if (result != 0) {
-        _friendlyName->setText(QStringLiteral("Volume not found."));
-        setStatus(readyStatus());
+    if (result != 0 || volumes.isEmpty()) {
+        // The fields keep what the device said last; the failure is no volume property.
+        setStatus(result != 0 ? QStringLiteral("Could not read the volumes: error %1").arg(result)
+                              : QStringLiteral("The device has no volume"));
         return;
     }
     // A set has no order of its own: "the first volume" is the one mounted highest.
-    QList<VolumeInfo> ordered(volumes.cbegin(), volumes.cend());
-    std::sort(ordered.begin(), ordered.end(),
+    m_volumes = QList<VolumeInfo>(volumes.cbegin(), volumes.cend());
+    std::sort(m_volumes.begin(), m_volumes.end(),
               [](const VolumeInfo& a, const VolumeInfo& b) { return a.mountPoint < b.mountPoint; });
-    const auto chosen = std::find_if(ordered.cbegin(), ordered.cend(), [&mountPoint](const VolumeInfo& volume) {
-        return mountPoint.isEmpty() || volume.mountPoint == mountPoint;
-    });
-    if (chosen == ordered.cend()) {
-        setStatus(readyStatus());
-        return;
+    auto chosen = std::find_if(m_volumes.cbegin(), m_volumes.cend(),
+                               [&mountPoint](const VolumeInfo& volume) { return volume.mountPoint == mountPoint; });
+    // A volume that went away: the first one instead.
+    if (chosen == m_volumes.cend())
+        chosen = m_volumes.cbegin();
+    if (keepView && chosen->mountPoint == m_volume.mountPoint) {
+        rememberView();
+    } else {
+        m_keepExpanded.clear();
+        m_keepSelected.clear();
     }
-
     m_volume = *chosen;
+    showVolumeFields();
+
+    // Without updates the view skips working out what each removal would repaint.
+    _fsTree->setUpdatesEnabled(false);
+    _fsTree->clear();
+    _fsTree->setUpdatesEnabled(true);
+    m_itemsByPath.clear();
+    _fsTree->header()->setSortIndicator(0, Qt::AscendingOrder);
+    _fsTree->setProperty("MountPoint", m_volume.mountPoint);
+    m_crawl->restart(m_volume.mountPoint);
+}
+
+void DeviceFileSystemView::showVolumeFields()
+{
+    _volumeChooser->clear();
+    for (const VolumeInfo& volume : std::as_const(m_volumes))
+        _volumeChooser->addItem(QStringLiteral("%1 (%2)").arg(volume.friendlyName, volume.mountPoint), volume.mountPoint);
+    _volumeChooser->setCurrentIndex(_volumeChooser->findData(m_volume.mountPoint));
+    _volumeChooserLabel->setVisible(m_volumes.size() > 1);
+    _volumeChooser->setVisible(m_volumes.size() > 1);
     _friendlyName->setText(m_volume.friendlyName);
     _fsMountPoint->setText(m_volume.mountPoint);
     _volumeSize->setText(formatSize(m_volume.volumeSize));
@@ -208,16 +209,18 @@ void DeviceFileSystemView::showVolume(int result, const QSet<VolumeInfo>& volume
     _volumeId->setText(QString::number(m_volume.volumeId));
     _mounted->setChecked(m_volume.mounted);
     _removable->setChecked(m_volume.removable);
-    _fsTree->header()->setSortIndicator(0, Qt::AscendingOrder);
-    _fsTree->setProperty("MountPoint", m_volume.mountPoint);
-    m_crawl->restart(m_volume.mountPoint);
 }
 
-void DeviceFileSystemView::reloadVolume()
+void DeviceFileSystemView::rememberView()
 {
-    const QString shown = m_volume.mountPoint;
-    m_volume.mountPoint.clear();
-    selectVolume(shown);
+    // What an earlier reload has not met again yet is still wanted.
+    for (QTreeWidgetItemIterator it(_fsTree); *it; ++it) {
+        const QString path = (*it)->data(0, Qt::UserRole).toString();
+        if ((*it)->isExpanded())
+            m_keepExpanded.insert(path);
+        if ((*it)->isSelected())
+            m_keepSelected.insert(path);
+    }
 }
 
 void DeviceFileSystemView::onTimeElapse()
@@ -256,10 +259,20 @@ void DeviceFileSystemView::graft(const FileSystemCrawl::Level& level)
     }
     // In the order the tree's sort gives them.
     std::stable_sort(items.begin(), items.end(), [](const QTreeWidgetItem* a, const QTreeWidgetItem* b) { return *a < *b; });
-    if (QTreeWidgetItem* parent = m_itemsByPath.value(level->Path()))
+    QTreeWidgetItem* parent = m_itemsByPath.value(level->Path());
+    if (parent)
         parent->addChildren(items);
     else
         _fsTree->addTopLevelItems(items);
+    // A folder is expanded again once its children are in.
+    if (parent && m_keepExpanded.remove(level->Path()))
+        parent->setExpanded(true);
+    if (m_keepSelected.isEmpty())
+        return;
+    for (QTreeWidgetItem* item : std::as_const(items)) {
+        if (m_keepSelected.remove(item->data(0, Qt::UserRole).toString()))
+            item->setSelected(true);
+    }
 }
 
 void DeviceFileSystemView::on__fsTree_itemCollapsed(QTreeWidgetItem*)
@@ -281,184 +294,141 @@ void DeviceFileSystemView::on__fsTree_itemClicked(QTreeWidgetItem* item, int col
 void DeviceFileSystemView::on__fsTree_itemDoubleClicked(QTreeWidgetItem* item, int column)
 {
     if (item && column == 0 && item->type() == ZantFSTreeWidget::FileItem)
-        emit doubleClick(item->data(0, Qt::UserRole).toString());
+        openOnComputer(item->data(0, Qt::UserRole).toString());
+}
+
+bool DeviceFileSystemView::busy()
+{
+    if (!m_transfer)
+        return false;
+    emit timedStatusChanged(QStringLiteral("Wait for the running copy to end"));
+    return true;
+}
+
+void DeviceFileSystemView::openOnComputer(const QString& devicePath)
+{
+    const QString name = QFileInfo(devicePath).fileName();
+    // A name like ".." would make the copy land outside the private folder.
+    if (!m_device || !FileTransferThread::isPlainName(name) || busy())
+        return;
+    // Not the shared temporary folder itself: another user could plant a file or a link there
+    // under the name the copy is about to take.
+    const PrivateTempFolder& folder = PrivateTempFolder::forProgram();
+    if (folder.path().isEmpty()) {
+        emit timedStatusChanged(QStringLiteral("Could not open %1: %2").arg(name, folder.error()));
+        return;
+    }
+    quint64 size = 0;
+    for (QTreeWidgetItemIterator it(_fsTree); *it && size == 0; ++it) {
+        if ((*it)->data(0, Qt::UserRole).toString() == devicePath)
+            size = (*it)->data(1, Qt::UserRole).toULongLong();
+    }
+    startTransfer({{FileTransferThread::Job::ToPC, devicePath, folder.path() + QLatin1Char('/') + name, size}}, After::Open);
 }
 
 void DeviceFileSystemView::OnRunTriggered(QString path)
 {
-    if (m_device)
-        m_device->RunApplication(path);
+    if (m_device && !busy())
+        startTransfer({{FileTransferThread::Job::Run, path, QString(), 0}}, After::Nothing);
 }
 
 void DeviceFileSystemView::OnDeleteTriggered(QString path)
 {
-    if (!m_device)
+    if (!m_device || busy())
         return;
     const QMessageBox::StandardButton answer = QMessageBox::question(
         this, QStringLiteral("Device File Delete"), QStringLiteral("Are you sure you want to delete ") + path,
         QMessageBox::Yes | QMessageBox::No, QMessageBox::No);
-    if (answer != QMessageBox::Yes)
-        return;
-    m_device->DeleteDeviceFile(path);
-    reloadVolume();
+    if (answer == QMessageBox::Yes)
+        startTransfer({{FileTransferThread::Job::Delete, path, QString(), 0}}, After::Reload);
 }
 
 void DeviceFileSystemView::copyDropToDevice(const QString& targetDirectory, const QList<QUrl>& urls)
 {
-    if (!m_device)
+    if (!m_device || busy())
         return;
-    if (m_transfer) {
-        emit timedStatusChanged(QStringLiteral("Wait for the running copy to end"));
+    QStringList paths;
+    for (const QUrl& url : urls)
+        paths.append(url.toLocalFile());
+    const TransferPlan plan = TransferPlan::forDrop(targetDirectory, paths, m_volume.freeSpace);
+    switch (plan.outcome()) {
+    case TransferPlan::Outcome::NoSpace:
+        QMessageBox::warning(this, QStringLiteral("Not enough space on the device"),
+                             QStringLiteral("The target does not have enough freespace to complete the copy"), QMessageBox::Ok);
         return;
-    }
-    QStringList files;
-    QString base;
-    quint64 total = 0;
-    for (const QUrl& url : urls) {
-        const QFileInfo dropped(url.toLocalFile());
-        if (base.isEmpty())
-            base = dropped.absolutePath();
-        if (dropped.isDir()) {
-            total += gatherFolder(dropped.absoluteFilePath(), files);
-        } else if (dropped.isFile() && !dropped.isSymLink()) {
-            total += quint64(dropped.size());
-            files.append(dropped.absoluteFilePath());
-        }
-        if (total >= m_volume.freeSpace) {
-            QMessageBox::warning(this, QStringLiteral("Not enough space on the device"),
-                                 QStringLiteral("The target does not have enough freespace to complete the copy"),
-                                 QMessageBox::Ok);
-            return;
-        }
-    }
-    if (files.isEmpty()) {
+    case TransferPlan::Outcome::NothingToCopy:
         QMessageBox::information(this, QStringLiteral("Files not Copied"),
-                                 QStringLiteral("The dropped selection did not contain any copyable files."),
-                                 QMessageBox::Ok);
+                                 QStringLiteral("The dropped selection did not contain any copyable files."), QMessageBox::Ok);
+        return;
+    case TransferPlan::Outcome::Ready:
+        startTransfer(plan.jobs(), After::Reload);
         return;
     }
-    files.sort();
-
-    QVector<FileTransferThread::Job> jobs;
-    jobs.reserve(files.size());
-    for (const QString& source : std::as_const(files)) {
-        // The dropped entries keep their names and inner layout below the target.
-        const QString remainder = source.startsWith(base) ? source.mid(base.size()) : source;
-        const bool package = source.endsWith(QLatin1String(".zantro"), Qt::CaseInsensitive);
-        jobs.append({package ? FileTransferThread::Job::Install : FileTransferThread::Job::ToDevice, source,
-                     joinDevicePath(targetDirectory, remainder), quint64(QFileInfo(source).size())});
-    }
-    startTransfer(jobs, true);
 }
 
-void DeviceFileSystemView::startWatchers()
+void DeviceFileSystemView::onDropFolderFound(const QString& folder)
 {
-    if (_fsTree->anchorPath().isEmpty())
-        return;
-    for (const QString& drive : WinVolumeMonitor::localDrives()) {
-        auto* watcher = new WinVolumeMonitor(drive);
-        connect(watcher, &WinVolumeMonitor::fileAddedEvent, this, &DeviceFileSystemView::on__desktopFileAdd);
-        // Some file managers write under a passing name and rename when done.
-        connect(watcher, &WinVolumeMonitor::fileNewNameEvent, this, &DeviceFileSystemView::on__desktopFileAdd);
-        watcher->start();
-        m_watchers.append(watcher);
-    }
-}
-
-void DeviceFileSystemView::stopWatchers()
-{
-    for (WinVolumeMonitor* watcher : std::as_const(m_watchers))
-        watcher->stop();
-    qDeleteAll(m_watchers);
-    m_watchers.clear();
-}
-
-void DeviceFileSystemView::on__draggingStart()
-{
-    m_dragActive = true;
-    m_dropFolder.clear();
-}
-
-void DeviceFileSystemView::on__desktopFileAdd(QString path)
-{
-    // Only the shell's copy of the anchor itself, never a file that merely has it in its path.
-    if (!m_dragActive || QFileInfo(path).fileName() != _fsTree->anchorFileName())
-        return;
-    QFile::remove(path);
-    m_dropFolder = QFileInfo(path).absolutePath();
-    m_dragActive = false;
-    copySelectionToPC(m_dropFolder);
-}
-
-void DeviceFileSystemView::on__draggingEnd()
-{
-    m_dropPollCount = 0;
-    m_dragTimer.start(DragPollMs);
-}
-
-void DeviceFileSystemView::on__dragTimerExpired()
-{
-    if (!m_dropFolder.isEmpty())
-        return;
-    if (++m_dropPollCount >= DragPolls) {
-        m_dragActive = false;
-        emit timedStatusChanged(QStringLiteral("Drop target not recognized"));
-        return;
-    }
-    m_dragTimer.start(DragPollMs);
-}
-
-void DeviceFileSystemView::on__draggingCancelled()
-{
-    m_dragActive = false;
-    m_dropFolder.clear();
+    m_dropFolder = folder;
+    copySelectionToPC(folder);
 }
 
 void DeviceFileSystemView::copySelectionToPC(const QString& folder)
 {
-    if (!m_device)
+    if (!m_device || busy())
         return;
-    if (m_transfer) {
-        emit timedStatusChanged(QStringLiteral("Wait for the running copy to end"));
-        return;
-    }
-    QVector<FileTransferThread::Job> jobs;
+    QVector<TransferPlan::DeviceEntry> entries;
     const QList<QTreeWidgetItem*> selected = _fsTree->selectedItems();
     for (const QTreeWidgetItem* item : selected) {
-        // An entry inside a selected folder comes with its folder.
         bool insideSelection = false;
         for (const QTreeWidgetItem* up = item->parent(); up && !insideSelection; up = up->parent())
             insideSelection = up->isSelected();
-        const QString name = item->text(0);
-        if (insideSelection || !FileTransferThread::isPlainName(name))
-            continue;
-        const bool file = item->type() == ZantFSTreeWidget::FileItem;
-        jobs.append({file ? FileTransferThread::Job::ToPC : FileTransferThread::Job::FolderToPC,
-                     item->data(0, Qt::UserRole).toString(), folder + QLatin1Char('/') + name,
-                     file ? item->data(1, Qt::UserRole).toULongLong() : 0});
+        entries.append({item->data(0, Qt::UserRole).toString(), item->text(0), item->type() == ZantFSTreeWidget::DirectoryItem,
+                        item->data(1, Qt::UserRole).toULongLong(), insideSelection});
     }
-    if (!jobs.isEmpty())
-        startTransfer(jobs, false);
+    TransferPlan plan = TransferPlan::forDragOut(entries, folder);
+    const QStringList existing = plan.existingTargets();
+    if (!existing.isEmpty()) {
+        QStringList names;
+        for (const QString& target : existing)
+            names.append(QFileInfo(target).fileName());
+        QMessageBox ask(QMessageBox::Question, QStringLiteral("Replace Files"),
+                        QStringLiteral("%1 already holds %2. Replace?").arg(folder, names.join(QStringLiteral(", "))),
+                        QMessageBox::Yes | QMessageBox::No | QMessageBox::Cancel, this);
+        ask.button(QMessageBox::Yes)->setText(QStringLiteral("Replace"));
+        ask.button(QMessageBox::No)->setText(QStringLiteral("Skip"));
+        const int answer = ask.exec();
+        if (answer == QMessageBox::Cancel)
+            return;
+        if (answer == QMessageBox::No)
+            plan.skipExisting();
+    }
+    if (plan.outcome() == TransferPlan::Outcome::Ready)
+        startTransfer(plan.jobs(), After::Nothing);
 }
 
-void DeviceFileSystemView::startTransfer(const QVector<FileTransferThread::Job>& jobs, bool reloadAfter)
+void DeviceFileSystemView::startTransfer(const QVector<FileTransferThread::Job>& jobs, After after)
 {
     m_transfer = new FileTransferThread(m_device, jobs, quint16(m_volume.volumeId & 0xFFFF));
     m_transferFiles = 0;
     m_transferBytes = 0;
     connect(m_transfer, &FileTransferThread::sized, this, &DeviceFileSystemView::onTransferSized);
     connect(m_transfer, &FileTransferThread::progress, this, &DeviceFileSystemView::onTransferProgress);
-    connect(m_transfer, &FileTransferThread::fileDone, this, &GatewayComponentWidget::timedStatusChanged);
-    connect(m_transfer, &QThread::finished, this, [this, reloadAfter] { onTransferEnded(reloadAfter); });
+    connect(m_transfer, &QThread::finished, this, [this, after] { onTransferEnded(after); });
 
-    // Shown only when the copy lasts; modal to the window, which still repaints.
+    // Shown only when the job lasts; modal to the window, which still repaints.
     m_progress = new QProgressDialog(this);
-    m_progress->setWindowTitle(QStringLiteral("Copying files"));
+    const FileTransferThread::Job::Kind kind = jobs.first().kind;
+    const bool copy = kind != FileTransferThread::Job::Run && kind != FileTransferThread::Job::Delete;
+    m_progress->setWindowTitle(copy ? QStringLiteral("Copying files") : QStringLiteral("Waiting for the device"));
+    m_progress->setLabelText(copy ? QString() : (kind == FileTransferThread::Job::Run ? QStringLiteral("Starting %1")
+                                                                                       : QStringLiteral("Deleting %1"))
+                                                    .arg(jobs.first().source));
     m_progress->setWindowModality(Qt::WindowModal);
     m_progress->setAutoClose(false);
     m_progress->setAutoReset(false);
     m_progress->setMinimumDuration(ProgressDelayMs);
     connect(m_progress, &QProgressDialog::canceled, m_transfer, &FileTransferThread::cancel, Qt::DirectConnection);
+    setCursor(Qt::BusyCursor);
     m_transfer->start();
 }
 
@@ -466,13 +436,14 @@ void DeviceFileSystemView::onTransferSized(int files, quint64 bytes)
 {
     m_transferFiles = files;
     m_transferBytes = bytes;
+    // Nothing to count: a busy bar.
     if (m_progress)
-        m_progress->setMaximum(std::max(1, kib(bytes)));
+        m_progress->setRange(0, bytes == 0 ? 0 : std::max(1, kib(bytes)));
 }
 
 void DeviceFileSystemView::onTransferProgress(int file, quint64 bytes, const QString& name)
 {
-    if (!m_progress || m_progress->wasCanceled())
+    if (!m_progress || m_progress->wasCanceled() || m_transferBytes == 0)
         return;
     m_progress->setLabelText(QStringLiteral("Copying file %1 of %2: %3\n%4 of %5")
                                  .arg(file + 1)
@@ -481,20 +452,33 @@ void DeviceFileSystemView::onTransferProgress(int file, quint64 bytes, const QSt
     m_progress->setValue(kib(bytes));
 }
 
-void DeviceFileSystemView::onTransferEnded(bool reloadAfter)
+void DeviceFileSystemView::onTransferEnded(After after)
 {
     if (!m_transfer)
         return;
     m_transfer->wait();
+    const QString summary = m_transfer->summary();
+    const bool changed = m_transfer->changedDevice();
+    const QStringList arrived = m_transfer->arrived();
     delete m_transfer;
     m_transfer = nullptr;
+    unsetCursor();
     // Later: a modal dialog's setValue lets events through, so this may run inside it.
     if (m_progress) {
         m_progress->close();
         m_progress->deleteLater();
     }
-    if (reloadAfter)
-        reloadVolume();
+    if (after == After::Open && !arrived.isEmpty())
+        emit timedStatusChanged(QStringLiteral("Opening %1").arg(QFileInfo(arrived.first()).fileName()));
+    else if (!summary.isEmpty())
+        emit timedStatusChanged(summary);
+    if (changed) {
+        if (after == After::Reload)
+            refresh();
+        emit deviceContentChanged();
+    }
+    if (after == After::Open && !arrived.isEmpty())
+        emit localCopyReady(arrived.first());
     emit transferFinished();
 }
 

@@ -12,22 +12,25 @@
 #include <QIcon>
 #include <QList>
 #include <QPointer>
+#include <QSet>
 #include <QSharedPointer>
-#include <QTimer>
 #include <QUrl>
 
+#include <memory>
+
+class DragOutWatcher;
 class QProgressDialog;
 class QTreeWidgetItem;
-class WinVolumeMonitor;
 class _ZantDevice;
 
-// The device file system page: the first volume of the device with its properties above a
-// tree of its folders and files. The worker crawls the volume folder by folder in an order
-// that favours the user areas, and the tick grafts one fetched level per tick into the
-// tree. Local files dropped on the tree are copied to the device (packages installed), the
-// tree's menu runs or deletes an entry, and a drag out of the tree copies the selected
-// device files into the local folder where the drag's anchor file landed. Copies run off
-// the GUI thread behind a progress dialog that can cancel them.
+// The device file system page: a volume of the device (a chooser when it has several)
+// with its properties above a tree of its folders and files. The worker crawls the volume
+// folder by folder in an order that favours the user areas, and the tick grafts one
+// fetched level per tick into the tree; a reload keeps the folders that were expanded and
+// the entries that were selected. Every device action runs as a job of FileTransferThread
+// behind a progress dialog (shown when it lasts) and ends in one message through
+// timedStatusChanged: drops (planned by TransferPlan), drags out (their folder found by
+// DragOutWatcher), files opened on this computer, runs and deletes.
 class DeviceFileSystemView : public GatewayComponentWidget, public Ui::DeviceFileSystemViewClass
 {
     Q_OBJECT
@@ -35,9 +38,7 @@ class DeviceFileSystemView : public GatewayComponentWidget, public Ui::DeviceFil
 public:
     static constexpr int FirstTickMs = 100;
     static constexpr int IdleCapMs = 1000;
-    static constexpr int DragPollMs = 500;
-    static constexpr quint32 DragPolls = 10;
-    // A copy shorter than this shows no progress dialog.
+    // A job shorter than this shows no progress dialog.
     static constexpr int ProgressDelayMs = 500;
 
     explicit DeviceFileSystemView(QWidget* parent = nullptr);
@@ -45,18 +46,8 @@ public:
 
     // Shows the volume at mountPoint (empty: the first one) unless it is shown already.
     void selectVolume(const QString& mountPoint);
-    // Reads the shown volume again and rebuilds the tree from its root.
-    void reloadVolume();
     // Copies the local files and folders of urls into targetDirectory on the device.
     void copyDropToDevice(const QString& targetDirectory, const QList<QUrl>& urls);
-
-    // The drag-out steps. Not slots: connected by hand, they would otherwise be taken
-    // for form connections by name.
-    void on__draggingStart();
-    void on__draggingEnd();
-    void on__draggingCancelled();
-    void on__desktopFileAdd(QString path);
-    void on__dragTimerExpired();
 
     const TickPacer& pacer() const;
     bool isTransferring() const;
@@ -71,6 +62,12 @@ public slots:
     void lowerPriority() override;
     QString xmlReport() override;
 
+    // Reads the shown volume again; the tree keeps its expanded folders that still exist
+    // and its selection.
+    void refresh();
+    // Copies the device file into this run's private folder; localCopyReady names the copy.
+    void openOnComputer(const QString& devicePath);
+
     void on__fsTree_itemCollapsed(QTreeWidgetItem* item);
     void on__fsTree_itemExpanded(QTreeWidgetItem* item);
     void on__fsTree_itemClicked(QTreeWidgetItem* item, int column);
@@ -81,37 +78,53 @@ public slots:
 
 signals:
     void singleClick(QString fileEntry);
-    void doubleClick(QString fileEntry);
-    // A drop or drag-out copy has ended (all files done, or cancelled).
+    // A file opened on this computer has arrived at localPath, to be shown there.
+    void localCopyReady(QString localPath);
+    // An install, copy, delete or run changed what the device holds.
+    void deviceContentChanged();
+    // A job has ended (all done, failed or cancelled).
     void transferFinished();
 
 private:
+    // What follows a job's end besides its message.
+    enum class After
+    {
+        Nothing,
+        Reload, // the tree shows what the job changed
+        Open    // the copy is handed on to be opened
+    };
+
+    void loadVolume(const QString& mountPoint, bool keepView);
     // Shows the volume the device answered with and starts its crawl.
-    void showVolume(int result, const QSet<VolumeInfo>& volumes, const QString& mountPoint);
+    void showVolume(int result, const QSet<VolumeInfo>& volumes, const QString& mountPoint, bool keepView);
+    void showVolumeFields();
+    void rememberView();
     void graft(const FileSystemCrawl::Level& level);
-    void startWatchers();
-    void stopWatchers();
-    // Copies the tree's selected entries into folder (a recognised drag-out target).
+    void onDropFolderFound(const QString& folder);
+    // Copies the tree's selected entries into folder, asking before replacing.
     void copySelectionToPC(const QString& folder);
-    void startTransfer(const QVector<FileTransferThread::Job>& jobs, bool reloadAfter);
+    // True, with a message, while a job runs.
+    bool busy();
+    void startTransfer(const QVector<FileTransferThread::Job>& jobs, After after);
     void onTransferSized(int files, quint64 bytes);
     void onTransferProgress(int file, quint64 bytes, const QString& name);
-    void onTransferEnded(bool reloadAfter);
+    void onTransferEnded(After after);
     void releaseTransfer();
 
     QSharedPointer<_ZantDevice> m_device;
     QIcon m_fileIcon;
     QIcon m_folderIcon;
     VolumeInfo m_volume;
+    QList<VolumeInfo> m_volumes; // by mount point
     quint64 m_volumeRequest = 0; // the latest volume read; earlier answers are dropped
     QSharedPointer<FileSystemCrawl> m_crawl = QSharedPointer<FileSystemCrawl>::create();
     TickPacer m_pacer{0, IdleCapMs};
     QHash<QString, QTreeWidgetItem*> m_itemsByPath;
-    QList<WinVolumeMonitor*> m_watchers;
-    bool m_dragActive = false;
+    // Of the view before a reload: expanded folders and selected entries not yet met again.
+    QSet<QString> m_keepExpanded;
+    QSet<QString> m_keepSelected;
+    std::unique_ptr<DragOutWatcher> m_dragOut;
     QString m_dropFolder;
-    quint32 m_dropPollCount = 0;
-    QTimer m_dragTimer;
     FileTransferThread* m_transfer = nullptr;
     QPointer<QProgressDialog> m_progress;
     int m_transferFiles = 0;

@@ -87,7 +87,7 @@ void WinVolumeMonitor::run()
         if (m_stop || (waits[1].revents & POLLIN))
             return;
         for (;;) {
-            const ssize_t length = ::read(m_inotify, buffer, sizeof buffer);
+            const qint64 length = readEvents(buffer, qint64(sizeof buffer));
             if (length <= 0)
                 break;
             handleEvents(buffer, length);
@@ -95,6 +95,11 @@ void WinVolumeMonitor::run()
                 return;
         }
     }
+}
+
+qint64 WinVolumeMonitor::readEvents(char* buffer, qint64 size)
+{
+    return qint64(::read(m_inotify, buffer, size_t(size)));
 }
 
 void WinVolumeMonitor::watchTree(const QString& folder, bool report)

@@ -45,6 +45,9 @@ signals:
 
 protected:
     void run() override;
+    // Reads pending event records of the kernel into buffer: their length, or 0 or less when
+    // none are pending.
+    virtual qint64 readEvents(char* buffer, qint64 size);
 
 private:
     // Watches folder and the folders below it; with report, also announces what it finds
