@@ -89,6 +89,11 @@ bool GatewayComponentWidget::isComplete()
     return false;
 }
 
+bool GatewayComponentWidget::refresh()
+{
+    return false;
+}
+
 bool GatewayComponentWidget::statusIsReady() const
 {
     return status() == readyStatus();
