@@ -158,8 +158,6 @@ int main(int argc, char** argv)
         out() << QStringLiteral("paused device, enablement indicator: longest GUI gap %1 ms (target 33)\n")
                      .arg(longestGap([indicator] { return !indicator->isBusy(); }));
     }
-    out() << QStringLiteral("paused device, window: longest GUI gap %1 ms until it counts the device gone\n")
-                 .arg(longestGap([&window] { return !window.deviceConnected(); }));
     ::kill(pid_t(server.processId()), SIGCONT);
     out().flush();
     server.kill();
