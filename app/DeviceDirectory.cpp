@@ -42,8 +42,9 @@ void DeviceDirectory::probe()
 
 void DeviceDirectory::publish(const QList<QPair<QString, QString>>& devices)
 {
-    if (devices == m_devices)
-        return;
+    const bool differs = devices != m_devices;
     m_devices = devices;
-    emit changed();
+    if (differs)
+        emit changed();
+    emit probed();
 }

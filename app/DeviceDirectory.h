@@ -30,6 +30,8 @@ public:
 signals:
     // devices() differs from what it was.
     void changed();
+    // A probe has ended, whether or not the list changed.
+    void probed();
 
 private:
     void probe();

@@ -1,23 +1,24 @@
 #include "DeviceWindow.h"
 
+#include "DeviceDirectory.h"
 #include "DeviceFileSystemView.h"
-#include "EnsureWindowPlacementOnDesktop.h"
+#include "GatewayCall.h"
 #include "LockStatusWidget.h"
 #include "ModuleInfoDialog.h"
 #include "Portlex.h"
 #include "SaveXmlReport.h"
 #include "SecuritySettingsDialog.h"
+#include "WindowCascade.h"
 
 #include <QActionGroup>
+#include <QApplication>
 #include <QCloseEvent>
-#include <QCoreApplication>
 #include <QDesktopServices>
 #include <QFileInfo>
 #include <QLabel>
 #include <QLineEdit>
 #include <QPointer>
 #include <QSettings>
-#include <QTimer>
 #include <QUrl>
 
 namespace {
@@ -39,6 +40,42 @@ ModuleInfoDialog* newModuleInfoDialog()
     return dialog;
 }
 
+// The indexes of the stack, as the form orders them.
+enum Slot
+{
+    PhoneInfoSlot = 0,
+    ModuleSlot = 1,
+    ClassSlot = 2,
+    SettingsSlot = 3,
+    RegistrySlot = 4,
+    FileSystemSlot = 5,
+    FamilySlot = 6,
+    ProcessSlot = 7,
+    LoadedModuleSlot = 8,
+    LevelSlot = 9,
+    SlotCount = 10
+};
+
+// The pages built from the device record, which only a new connect refreshes.
+const QSet<int> RecordSlots = {PhoneInfoSlot, ClassSlot, FamilySlot, LevelSlot};
+// The pages whose data an install, a delete or a run can change.
+const QSet<int> ContentSlots = {ModuleSlot, ClassSlot, FamilySlot, RegistrySlot, LevelSlot, FileSystemSlot};
+
+QSet<int> allSlots()
+{
+    QSet<int> indexes;
+    for (int index = 0; index < SlotCount; ++index)
+        indexes.insert(index);
+    return indexes;
+}
+
+struct ConnectAnswer
+{
+    int code = 0;
+    QString reason;
+    QSharedPointer<const DeviceCache> cache;
+};
+
 QWidget* fixedSpacer(int width, int height, QWidget* parent)
 {
     auto* spacer = new QWidget(parent);
@@ -56,10 +93,6 @@ DeviceWindow::DeviceWindow(QWidget* parent)
     setAttribute(Qt::WA_DeleteOnClose);
 
     setupUi(this);
-    m_timedStatusTimer = new QTimer(this);
-    m_timedStatusTimer->setSingleShot(true);
-    m_timedStatusTimer->setInterval(TimedStatusMs);
-    connect(m_timedStatusTimer, &QTimer::timeout, this, &DeviceWindow::onTimedStatusExpire);
     _toolbar->setMinimumHeight(40);
 
     const QList<QPair<QAction*, int>> pageActions = {
@@ -82,6 +115,10 @@ DeviceWindow::DeviceWindow(QWidget* parent)
                             actionDevice_File_System, _actionLevelView})
         pageGroup->addAction(action);
     action_Phone_Information->setChecked(true);
+    m_refreshAction = new QAction(tr("&Refresh"), this);
+    m_refreshAction->setShortcut(QKeySequence::Refresh);
+    connect(m_refreshAction, &QAction::triggered, this, &DeviceWindow::refreshCurrentPage);
+    menu_View->addAction(m_refreshAction);
     menu_View->addAction(_toolbar->toggleViewAction());
 
     connect(actionE_xit, &QAction::triggered, this, &QWidget::close);
@@ -91,6 +128,10 @@ DeviceWindow::DeviceWindow(QWidget* parent)
     _stackedWidget->setCurrentIndex(0);
 
     fillEmptySlots();
+    for (int index = 0; index < _stackedWidget->count(); ++index) {
+        if (GatewayComponentWidget* page = pageAt(index))
+            preparePage(page);
+    }
     showHintCursor();
     Portlex::Ref();
 }
@@ -108,9 +149,19 @@ void DeviceWindow::buildStatusBar()
     m_status->setSizePolicy(QSizePolicy::Fixed, QSizePolicy::Fixed);
     m_status->setMinimumWidth(160);
     _statusBar->addWidget(m_status);
+    m_message = new QLabel(_statusBar);
+    m_message->setObjectName("_message");
+    m_message->setTextInteractionFlags(Qt::TextSelectableByMouse);
+    _statusBar->addWidget(m_message, 1);
     m_lockStatus = new LockStatusWidget(_statusBar);
     _statusBar->addPermanentWidget(m_lockStatus);
     connect(m_lockStatus, &QAbstractButton::released, this, &DeviceWindow::onLockStatusReleased);
+    connect(m_lockStatus, &LockStatusWidget::failed, this, [this](int code, const QString& text) {
+        if (GatewayCall::deviceAbsent(code))
+            markGone();
+        else
+            showMessage(text);
+    });
 }
 
 void DeviceWindow::buildSearchBox()
@@ -134,6 +185,8 @@ void DeviceWindow::buildSearchBox()
     _toolbar->addWidget(fixedSpacer(20, 10, _toolbar));
 
     connect(m_searchBox, &QLineEdit::textEdited, this, &DeviceWindow::onSearch);
+    // A new search is a new action: the last one's message goes.
+    connect(m_searchBox, &QLineEdit::textEdited, this, [this] { showMessage(QString()); });
     m_searchLabel->setEnabled(false);
     m_searchBox->setEnabled(false);
 }
@@ -174,14 +227,16 @@ void DeviceWindow::setDevice(const QString& deviceId)
     m_deviceId = deviceId;
     m_device = Portlex::GetDevice(deviceId);
     if (m_device) {
-        restorePlacement(m_device->name);
+        // Filled by the connect that opened the window, which has handed the device over.
+        m_cache = m_device->cache();
+        m_placement = std::make_unique<WindowCascade>(m_device->name, CascadeOffset);
+        m_placement->restore(this, QPoint(100, 100), QSize(900, 600));
         m_lockStatus->setDevice(deviceId);
         _phoneInfoWidget->startComponent(deviceId);
-        m_cache = m_device->cache();
-        _phoneInfoWidget->setDeviceRecord(m_cache.data());
-        _classListView->setDeviceRecord(m_cache.data());
-        _levelViewWidget->setDeviceRecord(m_cache.data());
-        _familyTreeView->setDeviceRecord(m_cache.data());
+        for (int index : RecordSlots)
+            preparePage(pageAt(index));
+        m_directory = new DeviceDirectory(ProbeIntervalMs, this);
+        connect(m_directory, &DeviceDirectory::probed, this, &DeviceWindow::onDirectoryProbed);
     }
 
     _stackedWidget->setCurrentIndex(0);
@@ -196,16 +251,22 @@ void DeviceWindow::setDevice(const QString& deviceId)
     }
 }
 
-void DeviceWindow::restorePlacement(const QString& deviceName)
+void DeviceWindow::preparePage(GatewayComponentWidget* page)
 {
-    QSettings settings;
-    settings.beginGroup(deviceName);
-    const QPoint position = settings.value("pos", QPoint(100, 100)).toPoint();
-    const QSize size = settings.value("size", QSize(900, 600)).toSize();
-    settings.endGroup();
-    resize(size);
-    move(position);
-    EnsureWindowPlacementOnDesktop(this);
+    if (!page)
+        return;
+    connect(page, &GatewayComponentWidget::deviceContentChanged, this, &DeviceWindow::onDeviceContentChanged,
+            Qt::UniqueConnection);
+    if (!m_device)
+        return;
+    if (page == _phoneInfoWidget)
+        _phoneInfoWidget->setDeviceRecord(m_cache.data());
+    else if (page == _classListView)
+        _classListView->setDeviceRecord(m_cache.data());
+    else if (page == _levelViewWidget)
+        _levelViewWidget->setDeviceRecord(m_cache.data());
+    else if (page == _familyTreeView)
+        _familyTreeView->setDeviceRecord(m_cache.data());
 }
 
 void DeviceWindow::attachCurrentPage()
@@ -215,6 +276,7 @@ void DeviceWindow::attachCurrentPage()
     connect(m_currentPage, &GatewayComponentWidget::statusChanged, this, &DeviceWindow::SetStatus);
     connect(m_currentPage, &GatewayComponentWidget::timedStatusChanged, this, &DeviceWindow::SetTimedStatus);
     connect(m_currentPage, &GatewayComponentWidget::stateChanged, this, &DeviceWindow::onComponentStateChange);
+    m_shownSlots.insert(_stackedWidget->currentIndex());
     m_currentPage->raisePriority();
     m_currentPage->startComponent(m_deviceId);
     onComponentStateChange(m_currentPage->state());
@@ -225,7 +287,7 @@ void DeviceWindow::detachCurrentPage()
 {
     if (!m_currentPage)
         return;
-    m_timedStatusTimer->stop();
+    showMessage(QString());
     m_currentPage->lowerPriority();
     disconnect(m_currentPage, nullptr, this, nullptr);
     m_currentPage = nullptr;
@@ -245,6 +307,8 @@ void DeviceWindow::onToolbarActionTriggered(QAction* triggerAction)
         return;
     detachCurrentPage();
     _stackedWidget->setCurrentIndex(index);
+    if (m_staleSlots.remove(index) && deviceConnected())
+        requery({index});
     m_currentPage = pageAt(index);
     if (m_currentPage == _moduleListView)
         connect(_moduleListView, &ModuleListView::doubleClick, this, &DeviceWindow::onModuleInfoExamine);
@@ -261,7 +325,7 @@ void DeviceWindow::onComponentStateChange(GatewayComponentWidget::ComponentState
 {
     if (fromDetachedPage())
         return;
-    const bool complete = state == GatewayComponentWidget::Complete && m_currentPage;
+    const bool complete = state == GatewayComponentWidget::Complete && m_currentPage && deviceConnected();
     const bool searchable = complete && m_currentPage->canSearch();
     m_searchLabel->setEnabled(searchable);
     m_searchBox->setEnabled(searchable);
@@ -271,19 +335,28 @@ void DeviceWindow::onComponentStateChange(GatewayComponentWidget::ComponentState
 
 void DeviceWindow::SetStatus(QString statusString)
 {
-    if (fromDetachedPage())
+    // While the device is away, that is what the status says, whatever the pages find.
+    if (fromDetachedPage() || !deviceConnected())
         return;
     m_status->setText(statusString);
-    QCoreApplication::processEvents();
 }
 
 void DeviceWindow::SetTimedStatus(QString statusMessage)
 {
     if (fromDetachedPage())
         return;
-    m_timedStatusTimer->start();
-    m_status->setText(statusMessage);
-    QCoreApplication::processEvents();
+    showMessage(statusMessage);
+}
+
+void DeviceWindow::showMessage(const QString& text)
+{
+    m_message->setText(text);
+    m_message->setToolTip(text);
+}
+
+QString DeviceWindow::message() const
+{
+    return m_message->text();
 }
 
 void DeviceWindow::onLockStatusReleased()
@@ -293,6 +366,8 @@ void DeviceWindow::onLockStatusReleased()
 
 void DeviceWindow::onActionSecuritySettingsTriggered()
 {
+    if (!deviceConnected())
+        return;
     // Exit closes every window while the dialog runs: after it, nothing of this window is
     // touched unless it is still there.
     const QString deviceId = m_deviceId;
@@ -308,15 +383,11 @@ void DeviceWindow::onActionSecuritySettingsTriggered()
 
 void DeviceWindow::onModuleInfoExamine(ModuleInfo displayMe)
 {
+    if (!deviceConnected())
+        return;
     ModuleInfoDialog* dialog = newModuleInfoDialog();
     dialog->openDeviceModule(m_deviceId, displayMe);
     dialog->show();
-}
-
-void DeviceWindow::onTimedStatusExpire()
-{
-    if (m_currentPage)
-        m_status->setText(m_currentPage->status());
 }
 
 void DeviceWindow::onSearch(QString searchChars)
@@ -349,13 +420,182 @@ void DeviceWindow::onLocalCopyReady(QString local)
 
 void DeviceWindow::closeEvent(QCloseEvent* event)
 {
-    if (m_device) {
-        QSettings settings;
-        settings.beginGroup(m_device->name);
-        settings.setValue("pos", pos());
-        settings.setValue("size", size());
-        settings.endGroup();
-    }
+    if (m_placement)
+        m_placement->save(this);
     deleteLater();
     event->accept();
+}
+
+void DeviceWindow::onDirectoryProbed()
+{
+    bool listed = false;
+    for (const auto& device : m_directory->devices())
+        listed = listed || device.second == m_deviceId;
+    if (!listed) {
+        if (++m_missedProbes >= MissedProbesForGone)
+            markGone();
+        return;
+    }
+    m_missedProbes = 0;
+    if (m_link == Link::Gone)
+        reconnect(allSlots());
+}
+
+void DeviceWindow::markGone()
+{
+    if (m_link != Link::Gone)
+        setLink(Link::Gone);
+}
+
+void DeviceWindow::setLink(Link link)
+{
+    m_link = link;
+    const bool connected = link == Link::Connected;
+    // The pages keep what they showed, greyed, and take no action while the device is away.
+    _stackedWidget->setEnabled(connected);
+    action_Security_Settings->setEnabled(connected);
+    m_refreshAction->setEnabled(connected);
+    switch (link) {
+    case Link::Gone:
+        m_lockStatus->showDisconnected();
+        m_status->setText(tr("Device disconnected"));
+        break;
+    case Link::Returning:
+        m_status->setText(tr("Connecting again..."));
+        break;
+    case Link::Connected:
+        m_lockStatus->setDevice(m_deviceId);
+        if (m_currentPage)
+            m_status->setText(m_currentPage->status());
+        break;
+    }
+    onComponentStateChange(m_currentPage ? m_currentPage->state() : GatewayComponentWidget::Starting);
+}
+
+void DeviceWindow::reconnect(const QSet<int>& indexes)
+{
+    if (!m_device || m_link == Link::Returning)
+        return;
+    const Link before = m_link;
+    setLink(Link::Returning);
+    const QSharedPointer<_ZantDevice> device = m_device;
+    GatewayCall::run(
+        this,
+        [device] {
+            ConnectAnswer answer;
+            if (Portlex::ConnectDevice(device, QString(), QString(), &answer.code, &answer.reason))
+                answer.cache = device->cache();
+            return answer;
+        },
+        [this, indexes, before](const ConnectAnswer& answer) {
+            if (answer.code != 0) {
+                // A device that is not there is gone; one that answers but refuses stays as it was.
+                const bool absent = GatewayCall::deviceAbsent(answer.code) || before == Link::Gone;
+                setLink(absent ? Link::Gone : before);
+                showMessage(GatewayCall::failureText(answer.code, answer.reason));
+                return;
+            }
+            rebuildPages(indexes, answer.cache);
+            setLink(Link::Connected);
+        });
+}
+
+void DeviceWindow::requery(const QSet<int>& indexes)
+{
+    QSet<int> replaced;
+    for (int index : indexes) {
+        GatewayComponentWidget* page = pageAt(index);
+        if (page && !RecordSlots.contains(index) && page->refresh())
+            continue;
+        replaced.insert(index);
+    }
+    if (replaced.intersects(RecordSlots))
+        reconnect(replaced);
+    else if (!replaced.isEmpty())
+        rebuildPages(replaced, nullptr);
+}
+
+void DeviceWindow::rebuildPages(const QSet<int>& indexes, const QSharedPointer<const DeviceCache>& record)
+{
+    const int shown = _stackedWidget->currentIndex();
+    const bool reattach = indexes.contains(shown) && m_currentPage;
+    if (reattach)
+        detachCurrentPage();
+    QSet<int> built;
+    for (int index : indexes) {
+        GatewayComponentWidget* old = pageAt(index);
+        m_staleSlots.remove(index);
+        if (!old)
+            continue;
+        // After a return, a page that can refresh in place keeps what the user opened in it.
+        if (record && !RecordSlots.contains(index) && old->refresh())
+            continue;
+        // Its worker stops before the record it may read is replaced.
+        delete old;
+        built.insert(index);
+    }
+    if (record)
+        m_cache = record;
+    for (int index : built) {
+        QWidget* slot = _stackedWidget->widget(index);
+        GatewayComponentWidget* page = createPage(index, slot);
+        slot->layout()->addWidget(page);
+        preparePage(page);
+        // A page that was shown asks again at once, shown or not.
+        if (index != shown && m_shownSlots.contains(index)) {
+            page->startComponent(m_deviceId);
+            page->lowerPriority();
+        }
+    }
+    if (reattach) {
+        m_currentPage = pageAt(shown);
+        if (m_currentPage == _moduleListView)
+            connect(_moduleListView, &ModuleListView::doubleClick, this, &DeviceWindow::onModuleInfoExamine);
+        if (m_currentPage == _deviceFSView)
+            connect(_deviceFSView, &DeviceFileSystemView::doubleClick, this, &DeviceWindow::onFileSystemDoubleClick);
+        attachCurrentPage();
+    }
+}
+
+GatewayComponentWidget* DeviceWindow::createPage(int index, QWidget* slot)
+{
+    switch (index) {
+    case PhoneInfoSlot:
+        return _phoneInfoWidget = new PhoneInfoWidget(slot);
+    case ModuleSlot:
+        return _moduleListView = new ModuleListView(slot);
+    case ClassSlot:
+        return _classListView = new ClassListView(slot);
+    case SettingsSlot:
+        return _settingsTreeView = new ISettingsTreeView(slot);
+    case RegistrySlot:
+        return _registryListView = new RegistryListView(slot);
+    case FileSystemSlot:
+        return _deviceFSView = new DeviceFileSystemView(slot);
+    case FamilySlot:
+        return _familyTreeView = new FamilyTreeView(slot);
+    case ProcessSlot:
+        return _processView = new ProcessView(slot);
+    case LoadedModuleSlot:
+        return _loadedModuleView = new LoadedModuleView(slot);
+    default:
+        return _levelViewWidget = new LevelViewWidget(slot);
+    }
+}
+
+void DeviceWindow::refreshCurrentPage()
+{
+    if (!deviceConnected())
+        return;
+    showMessage(QString());
+    requery({_stackedWidget->currentIndex()});
+}
+
+void DeviceWindow::onDeviceContentChanged()
+{
+    // The page that made the change shows it itself; the others ask when next shown.
+    for (int index : ContentSlots) {
+        if (index != _stackedWidget->currentIndex())
+            m_staleSlots.insert(index);
+    }
 }

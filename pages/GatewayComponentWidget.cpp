@@ -89,6 +89,11 @@ bool GatewayComponentWidget::isComplete()
     return state() == Complete;
 }
 
+bool GatewayComponentWidget::refresh()
+{
+    return false;
+}
+
 QString GatewayComponentWidget::errorStatus(int result)
 {
     return QStringLiteral("Error: ") + QString::number(result);

@@ -62,11 +62,17 @@ public slots:
     // Every fetched record is shown: the state is Complete, whatever the status reads.
     virtual bool isComplete();
     virtual QString xmlReport() = 0;
+    // Asks the device again in place (keeping what the user opened, say) and returns true;
+    // a page that cannot returns false, the default, and the window replaces it by a new one.
+    virtual bool refresh();
 
 signals:
     void statusChanged(QString statusMessage);
     void timedStatusChanged(QString statusMessage);
     void stateChanged(GatewayComponentWidget::ComponentState state);
+    // An action of this page (an install, a delete, a run) changed what the device holds:
+    // the window asks its other pages again when they are next shown.
+    void deviceContentChanged();
 
 protected:
     // The search entry of a table page: from three characters on searches the table,

@@ -198,6 +198,18 @@ void LiveTreePage::markGone(QTreeWidgetItem* row, int column)
         row->setForeground(column, QBrush(Qt::red));
 }
 
+void LiveTreePage::markListed(QTreeWidgetItem* row, int column)
+{
+    if (row->data(0, StateRole).toInt() != Gone)
+        return;
+    const QSignalBlocker quiet(row->treeWidget()->model());
+    // Still in the counting list: the next aging pass drops it, as it does any shown row.
+    row->setData(0, StateRole, Shown);
+    row->setData(0, AgeRole, 0);
+    if (column == EntryColumn)
+        row->setForeground(column, QBrush(Qt::black));
+}
+
 bool LiveTreePage::ageRows()
 {
     QVector<QTreeWidgetItem*> counting;

@@ -116,8 +116,10 @@ protected:
                 addProcessRow(row);
                 continue;
             }
-            for (QTreeWidgetItem* row : *rows)
+            for (QTreeWidgetItem* row : *rows) {
+                markListed(row, ProcessColumn);
                 mergeEntries(row, process.*entries, fill);
+            }
         }
         for (QTreeWidgetItem* row : noted) {
             if (!listed.contains(rowId(row)))
@@ -132,12 +134,14 @@ private:
     void mergeEntries(QTreeWidgetItem* row, const QVector<Entry>& entries, Fill fill)
     {
         const QVector<QTreeWidgetItem*> noted = childRows(row);
-        QSet<quint32> known;
+        QHash<quint32, QTreeWidgetItem*> known;
         for (QTreeWidgetItem* child : noted)
-            known.insert(rowId(child));
+            known.insert(rowId(child), child);
         for (const Entry& entry : entries) {
-            if (known.contains(entry.id))
+            if (QTreeWidgetItem* child = known.value(entry.id)) {
+                markListed(child, EntryColumn);
                 continue;
+            }
             QTreeWidgetItem* child = newEntryRow(entry.id);
             fill(child, entry);
             row->addChild(child);
@@ -159,6 +163,8 @@ private:
     QTreeWidgetItem* newEntryRow(quint32 id);
     void addProcessRow(QTreeWidgetItem* row);
     void markGone(QTreeWidgetItem* row, int column);
+    // A row marked gone whose id is listed again is shown as before; ids can come back.
+    void markListed(QTreeWidgetItem* row, int column);
     // One aging pass over the rows that count their ticks; true while some still do.
     bool ageRows();
 

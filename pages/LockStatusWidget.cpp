@@ -1,6 +1,8 @@
 #include "LockStatusWidget.h"
 
 #include "EnablementExpiry.h"
+#include "EnablementQuery.h"
+#include "GatewayCall.h"
 #include "Portlex.h"
 
 #include <QMouseEvent>
@@ -41,24 +43,58 @@ void LockStatusWidget::setDevice(const QString& deviceId)
     if (!device)
         return;
     m_device = device;
+    m_busy = true;
+    const int question = ++m_question;
+    GatewayCall::run(
+        this, [device] { return EnablementQuery::ask(*device, false); },
+        [this, question](const EnablementQuery& answer) {
+            if (question != m_question)
+                return;
+            m_busy = false;
+            showAnswer(answer);
+        });
+}
 
-    QString mode, owner, expiry;
-    if (m_device->GlobalTestSigStatus(mode, owner, expiry) == EnablementEnabled) {
-        setToolTip(tr("Developer Enabled Signature expires:\n") + expiry);
+void LockStatusWidget::showAnswer(const EnablementQuery& answer)
+{
+    setEnabled(true);
+    if (answer.failed()) {
+        const QString text = GatewayCall::failureText(answer.code, answer.reason);
+        setToolTip(text);
+        _modeStatus->setText(tr("Not known"));
+        showLed(QStringLiteral(":/LockStatusWidget/Resources/UnlitLED.png"));
+        emit failed(answer.code, text);
+        return;
+    }
+    switch (answer.mode) {
+    case EnablementQuery::Signature:
+        setToolTip(tr("Developer Enabled Signature expires:\n") + answer.expiry);
         showLed(QStringLiteral(":/LockStatusWidget/Resources/Globe.png"));
         _modeStatus->setText(tr("Sig Enabled"));
         return;
-    }
-    if (m_device->TepStatus(mode, owner, expiry) == EnablementEnabled) {
-        setToolTip(tr("Developer Enabled Service expires:\n") + expiry);
-        showLed(serviceLedPicture(expiry, QDate::currentDate()));
+    case EnablementQuery::Service:
+        setToolTip(tr("Developer Enabled Service expires:\n") + answer.expiry);
+        showLed(serviceLedPicture(answer.expiry, QDate::currentDate()));
         _modeStatus->setText(tr("DES Enabled"));
         return;
+    case EnablementQuery::None:
+        break;
     }
     // Asked again after a lock, the expiry of a mode that has ended must not linger.
     setToolTip(QString());
     _modeStatus->setText(tr("Simulator Enabled"));
     showLed(QStringLiteral(":/LockStatusWidget/Resources/UnlitLED.png"));
+}
+
+void LockStatusWidget::showDisconnected()
+{
+    // An answer still under way belongs to the device that left.
+    ++m_question;
+    m_busy = false;
+    setToolTip(tr("The device is not connected"));
+    _modeStatus->setText(tr("Disconnected"));
+    showLed(QStringLiteral(":/LockStatusWidget/Resources/UnlitLED.png"));
+    setEnabled(false);
 }
 
 void LockStatusWidget::showLed(const QString& picture)

@@ -1,48 +1,54 @@
 #include "ModuleInfoDialog.h"
 
-#include "EnsureWindowPlacementOnDesktop.h"
+#include "GatewayCall.h"
 #include "Portlex.h"
+#include "PortlexErrors.h"
 #include "SaveXmlReport.h"
 
-#include <QSettings>
 
 namespace {
 
-const QString SettingsGroup = QStringLiteral("ModuleInfoDialog");
+struct MifAnswer
+{
+    int code = 0;
+    QString reason;
+    MifEntry entry;
+};
 
 } // namespace
 
 ModuleInfoDialog::ModuleInfoDialog(QWidget* parent)
     : QDialog(parent)
+    , m_placement(QStringLiteral("ModuleInfoDialog"), CascadeOffset)
 {
     setupUi(this);
     setAttribute(Qt::WA_DeleteOnClose);
     // The button's object name does not match this handler's, so it is not bound by name.
     connect(okButton, &QPushButton::clicked, this, &ModuleInfoDialog::on__okButton_clicked);
 
-    QSettings settings;
-    settings.beginGroup(SettingsGroup);
-    const QPoint position = settings.value("pos", QPoint(100, 100)).toPoint();
-    const QSize size = settings.value("size", QSize(600, 350)).toSize();
-    settings.endGroup();
-    move(position + QPoint(CascadeOffset, CascadeOffset));
-    resize(size);
-    EnsureWindowPlacementOnDesktop(this);
+    m_placement.restore(this, QPoint(100, 100), QSize(600, 350));
 }
 
 ModuleInfoDialog::~ModuleInfoDialog()
 {
-    QSettings settings;
-    settings.beginGroup(SettingsGroup);
-    settings.setValue("pos", pos());
-    settings.setValue("size", size());
-    settings.endGroup();
+    m_placement.save(this);
 }
 
 void ModuleInfoDialog::setModuleName(const QString& name)
 {
     m_moduleName = name;
     setWindowTitle(QStringLiteral("Module Info ") + name);
+}
+
+void ModuleInfoDialog::showMessage(const QString& text)
+{
+    _message->setText(text);
+    _message->setVisible(!text.isEmpty());
+}
+
+QString ModuleInfoDialog::message() const
+{
+    return _message->text();
 }
 
 void ModuleInfoDialog::openMifFile(const QString& path, const QString& name)
@@ -53,14 +59,37 @@ void ModuleInfoDialog::openMifFile(const QString& path, const QString& name)
 
 void ModuleInfoDialog::openDeviceModule(const QString& deviceId, const ModuleInfo& moduleInfo)
 {
-    Portlex::Ref();
     setModuleName(moduleInfo.name);
-    if (const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(deviceId)) {
-        MifEntry entry;
-        if (device->GetModuleMif(moduleInfo.path, entry) == 0)
-            _moduleInfoView->setMifEntry(entry);
+    const QSharedPointer<_ZantDevice> device = Portlex::GetDevice(deviceId);
+    if (!device) {
+        showMessage(GatewayCall::failureText(PortlexError::NotConnected, QString()));
+        return;
     }
-    Portlex::Deref();
+    m_busy = true;
+    _saveModInfoButton->setEnabled(false);
+    showMessage(tr("Reading the module's information from the device..."));
+    setCursor(Qt::BusyCursor);
+    const QString path = moduleInfo.path;
+    GatewayCall::run(
+        this,
+        [device, path] {
+            MifAnswer answer;
+            answer.code = device->GetModuleMif(path, answer.entry);
+            if (answer.code != 0)
+                answer.reason = device->statusText;
+            return answer;
+        },
+        [this](const MifAnswer& answer) {
+            m_busy = false;
+            unsetCursor();
+            if (answer.code != 0) {
+                showMessage(GatewayCall::failureText(answer.code, answer.reason));
+                return;
+            }
+            showMessage(QString());
+            _saveModInfoButton->setEnabled(true);
+            _moduleInfoView->setMifEntry(answer.entry);
+        });
 }
 
 void ModuleInfoDialog::on__saveModInfoButton_clicked()

@@ -1,18 +1,10 @@
 #include "PlatformComparisonDialog.h"
 
-#include "EnsureWindowPlacementOnDesktop.h"
 #include "SaveXmlReport.h"
-
-#include <QSettings>
-
-namespace {
-
-const QString SettingsGroup = QStringLiteral("PlatformComparisonDialog");
-
-} // namespace
 
 PlatformComparisonDialog::PlatformComparisonDialog(QWidget* parent)
     : QDialog(parent)
+    , m_placement(QStringLiteral("PlatformComparisonDialog"), CascadeOffset)
 {
     setupUi(this);
     setAttribute(Qt::WA_DeleteOnClose);
@@ -22,23 +14,12 @@ PlatformComparisonDialog::PlatformComparisonDialog(QWidget* parent)
     connect(
         _saveFileButton, &QPushButton::released, this, &PlatformComparisonDialog::OnSaveFileButtonClicked);
 
-    QSettings settings;
-    settings.beginGroup(SettingsGroup);
-    const QPoint position = settings.value("pos", QPoint(100, 100)).toPoint();
-    const QSize size = settings.value("size", QSize(900, 600)).toSize();
-    settings.endGroup();
-    move(position + QPoint(CascadeOffset, CascadeOffset));
-    resize(size);
-    EnsureWindowPlacementOnDesktop(this);
+    m_placement.restore(this, QPoint(100, 100), QSize(900, 600));
 }
 
 PlatformComparisonDialog::~PlatformComparisonDialog()
 {
-    QSettings settings;
-    settings.beginGroup(SettingsGroup);
-    settings.setValue("pos", pos());
-    settings.setValue("size", size());
-    settings.endGroup();
+    m_placement.save(this);
 }
 
 bool PlatformComparisonDialog::loadFile(const QString& path)

@@ -1,12 +1,13 @@
 #pragma once
 
+#include "WindowCascade.h"
 #include "ui_PlatformComparisonDialog.h"
 
 #include <QDialog>
 
-// The window of a platform scan comparison: the view, "Save to File..." and "Close". It opens
-// 16 pixels right and down from where the last one was, and deletes itself when closed,
-// storing its place and size then.
+// The window of a platform scan comparison: the view, "Save to File..." and "Close". Several
+// open at once stand in a cascade of 16 pixel steps (WindowCascade); it deletes itself when
+// closed, storing its place and size then.
 class PlatformComparisonDialog : public QDialog, public Ui::PlatformComparisonDialogClass
 {
     Q_OBJECT
@@ -22,4 +23,7 @@ public:
 public slots:
     void OnCloseButtonClicked();
     void OnSaveFileButtonClicked();
+
+private:
+    WindowCascade m_placement;
 };

@@ -1,15 +1,19 @@
 #include "PlatformTools.h"
 
 #include "FreeFormProgressDialog.h"
+#include "GatewayCall.h"
 #include "PlatformClassIDDialog.h"
 #include "PlatformComparisonDialog.h"
 #include "Portlex.h"
 
 #include <QCoreApplication>
+#include <QEventLoop>
 #include <QFileDialog>
 #include <QFileInfo>
 #include <QMessageBox>
 #include <QSettings>
+
+#include <atomic>
 
 namespace {
 
@@ -25,6 +29,50 @@ QString askOpenFile(const QString& caption, const QString& folder)
     const QString filter = QStringLiteral("*.xml");
     return prompts.askOpenFile ? prompts.askOpenFile(nullptr, caption, folder, filter)
                                : QFileDialog::getOpenFileName(nullptr, caption, folder, filter);
+}
+
+// The scan's progress, reported on the scanning thread and shown on the GUI thread: each
+// step is queued to the progress window, and a cancel there is read back through a flag.
+struct ScanProgress
+{
+    FreeFormProgressDialog* dialog = nullptr;  // lives until the scan has ended
+    std::atomic<bool> cancelled { false };
+
+    static bool report(void* context, int value, int maximum, const QString& text)
+    {
+        auto* progress = static_cast<ScanProgress*>(context);
+        QMetaObject::invokeMethod(
+            progress->dialog,
+            [progress, value, maximum, text] {
+                if (FreeFormProgressDialog::progressCallback(progress->dialog, value, maximum, text))
+                    progress->cancelled = true;
+            },
+            Qt::QueuedConnection);
+        return progress->cancelled;
+    }
+};
+
+// The gateway's scan on a worker, the GUI thread meanwhile turning its event loop.
+std::vector<MifEntry> scanOffTheGuiThread(const QString& folder, FreeFormProgressDialog* dialog)
+{
+    ScanProgress progress;
+    progress.dialog = dialog;
+    std::vector<MifEntry> entries;
+    QEventLoop loop;
+    GatewayCall::run(
+        &loop,
+        [folder, context = dialog ? &progress : nullptr] {
+            std::vector<MifEntry> found;
+            Portlex::GetPlatformClassIds(folder, found, context ? &ScanProgress::report : nullptr, context);
+            return found;
+        },
+        [&entries, &loop](std::vector<MifEntry> found) {
+            entries = std::move(found);
+            loop.quit();
+        });
+    // The steps were posted before the result, so none is left to reach the gone record.
+    loop.exec();
+    return entries;
 }
 
 } // namespace
@@ -66,8 +114,7 @@ void scanPlatformClassIds()
 std::unique_ptr<PlatformClassIDDialog> scanPlatformFolder(
     const QString& folder, FreeFormProgressDialog* progress)
 {
-    std::vector<MifEntry> entries;
-    Portlex::GetPlatformClassIds(folder, entries, FreeFormProgressDialog::progressCallback, progress);
+    const std::vector<MifEntry> entries = scanOffTheGuiThread(folder, progress);
     if (entries.empty())
         return nullptr;
     auto dialog = std::make_unique<PlatformClassIDDialog>();

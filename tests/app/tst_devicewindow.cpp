@@ -1,5 +1,7 @@
+#include "DeviceConnection.h"
 #include "DeviceWindow.h"
 #include "LockStatusWidget.h"
+#include "ModuleInfoDialog.h"
 #include "ModuleListView.h"
 #include "Portlex.h"
 #include "SaveXmlReport.h"
@@ -9,10 +11,13 @@
 #include "TestImage.h"
 #include "TestSupport.h"
 
+#include <QElapsedTimer>
 #include <QLabel>
 #include <QLineEdit>
 #include <QLocale>
 #include <QPointer>
+#include <QScrollArea>
+#include <QScrollBar>
 #include <QSettings>
 #include <QTemporaryDir>
 #include <QTest>
@@ -79,7 +84,7 @@ class DeviceWindowTest : public QObject
         return {page, action};
     }
     static QString statusText(DeviceWindow* window) { return window->_statusBar->findChild<QLabel*>("_status")->text(); }
-    static QTimer* timedStatusTimer(DeviceWindow* window) { return window->findChild<QTimer*>(QString(), Qt::FindDirectChildrenOnly); }
+    static LockStatusWidget* indicator(DeviceWindow* window) { return window->findChild<LockStatusWidget*>(); }
 
 private slots:
     void initTestCase()
@@ -104,19 +109,21 @@ private slots:
         QTest::addColumn<QString>("id");
         QTest::addColumn<QString>("title");
         QTest::addColumn<QString>("status");
-        QTest::newRow("simulator") << "aurora" << "Delvix - Simulator Aurora" << "Ready";
-        QTest::newRow("USB handset") << "kestrel" << "Delvix - Device: Kestrel K7" << "Ready";
-        QTest::newRow("unknown device") << "no-such-device" << "Delvix - no-such-device" << "Device not found";
+        QTest::addColumn<QString>("message");
+        QTest::newRow("simulator") << "aurora" << "Delvix - Simulator Aurora" << "Ready" << "";
+        QTest::newRow("USB handset") << "kestrel" << "Delvix - Device: Kestrel K7" << "Ready" << "";
+        QTest::newRow("unknown device") << "no-such-device" << "Delvix - no-such-device" << "" << "Device not found";
     }
     void titleAndFirstStatus()
     {
         QFETCH(QString, id);
         QFETCH(QString, title);
         QFETCH(QString, status);
+        QFETCH(QString, message);
         DeviceWindow* window = openWindow(id);
         QCOMPARE(window->windowTitle(), title);
         QCOMPARE(statusText(window), status);
-        QCOMPARE(timedStatusTimer(window)->isActive(), status != "Ready");
+        QCOMPARE(window->message(), message);
     }
 
     // Placement is stored per device name; a stored place off every screen is corrected.
@@ -139,6 +146,14 @@ private slots:
         QVERIFY(!window);
         QCOMPARE(settings.value("Zantro USB Device: Kestrel K7/pos").toPoint(), QPoint(150, 60));
         QCOMPARE(settings.value("Zantro USB Device: Kestrel K7/size").toSize(), QSize(880, 690));
+
+        // Windows of one place cascade, and each stores the place without its step.
+        settings.setValue("Zantro USB Device: Kestrel K7/size", QSize(400, 300));
+        const QPoint first = openWindow("kestrel")->pos();
+        DeviceWindow* second = openWindow("kestrel");
+        QCOMPARE(second->pos(), first + QPoint(DeviceWindow::CascadeOffset, DeviceWindow::CascadeOffset));
+        QVERIFY(second->close());
+        QCOMPARE(settings.value("Zantro USB Device: Kestrel K7/pos").toPoint(), first);
     }
 
     // Only the first two windows ever opened show the hint cursors: the module page's and the
@@ -164,7 +179,7 @@ private slots:
         page->setStatus("Processing Device Modules");
         window->SetTimedStatus("Passing message");
         window->action_Phone_Information->trigger();  // already shown: nothing happens
-        QCOMPARE(statusText(window), QString("Passing message"));
+        QCOMPARE(window->message(), QString("Passing message"));
 
         action->trigger();
         QCOMPARE(window->_stackedWidget->currentIndex(), action->data().toInt());
@@ -178,6 +193,7 @@ private slots:
         page->setStatus("Hidden page talking");
         emit page->timedStatusChanged("Hidden page passing");
         QCOMPARE(statusText(window), QString("Ready"));
+        QVERIFY(window->message().isEmpty());
         action->trigger();
         QCOMPARE(page->starts, 2);
         QCOMPARE(statusText(window), QString("Hidden page talking"));
@@ -218,25 +234,24 @@ private slots:
         QVERIFY(statusText(window).isEmpty() && !box->isEnabled() && !window->actionExport_to_XML->isEnabled());
     }
 
-    void timedStatusRestoresAndRestarts()
+    // An action's result stays beside the status until the next action: the page's ticks do
+    // not overwrite it, a search or a page switch ends it.
+    void actionResultsStayUntilTheNextAction()
     {
         DeviceWindow* window = openWindow("aurora");
-        QTimer* timer = timedStatusTimer(window);
-        QVERIFY(timer && timer->isSingleShot() && timer->interval() == DeviceWindow::TimedStatusMs);
-        timer->setTimerType(Qt::PreciseTimer);  // a coarse timer rounds its remaining time
-        window->SetTimedStatus("first");
-        QTRY_VERIFY(timer->remainingTime() < DeviceWindow::TimedStatusMs - 10);
-        const int left = timer->remainingTime();
-        window->SetTimedStatus("second");
-        QCOMPARE(statusText(window), QString("second"));
-        QVERIFY2(timer->remainingTime() > left, "a second message restarts the count");
-        QMetaObject::invokeMethod(timer, "timeout");
-        QCOMPARE(statusText(window), QString("Ready"));
-
-        // Leaving a page ends its passing message.
-        window->SetTimedStatus("third");
-        addSlot(window).second->trigger();
-        QVERIFY(!timer->isActive());
+        const auto [page, action] = addSlot(window);
+        action->trigger();
+        page->finish();
+        emit page->timedStatusChanged("Copied 3 files");
+        page->setStatus("Processing");
+        page->setStatus("Ready");
+        QCOMPARE(QStringList({statusText(window), window->message()}), QStringList({"Ready", "Copied 3 files"}));
+        QTest::keyClicks(window->_toolbar->findChild<QLineEdit*>(), "x");
+        QVERIFY(window->message().isEmpty());
+        emit page->timedStatusChanged("Error 1106: system folder");
+        QCOMPARE(window->message(), QString("Error 1106: system folder"));
+        window->action_Phone_Information->trigger();
+        QVERIFY(window->message().isEmpty());
     }
 
     // What the indicator and the dialog show in each mode, the dialog opened by a click on
@@ -296,6 +311,7 @@ private slots:
         window.setDevice(id);
         window.show();
         auto* status = window.findChild<LockStatusWidget*>();
+        QTRY_VERIFY(!status->isBusy());
         QCOMPARE(status->_modeStatus->text(), indicator.at(0));
         QCOMPARE(status->_ledStatus->pixmap().toImage(),
             QImage(Led.arg(indicator.at(1)))
@@ -303,18 +319,23 @@ private slots:
         QCOMPARE(status->toolTip(), indicator.at(2));
 
         QStringList shown;
-        QTimer::singleShot(0, this, [&] {
+        QTimer answered;
+        connect(&answered, &QTimer::timeout, this, [&] {
             auto* dialog = window.findChild<SecuritySettingsDialog*>();
-            const SecuritySettings* settings = dialog->_securitySettings;
+            const SecuritySettings* settings = dialog ? dialog->_securitySettings : nullptr;
+            if (!settings || settings->isBusy())
+                return;
+            answered.stop();
             shown << settings->_unlockModeLabel->text() << settings->_expiresLabel->text();
             for (int row = 0; row < settings->_priviledgeTable->rowCount(); ++row)
                 shown << settings->_priviledgeTable->item(row, 0)->text();
             settings->_lockButton->click();
             dialog->okButton->click();
         });
+        answered.start(10);
         QTest::mouseClick(status->_modeStatus, Qt::LeftButton);
         QCOMPARE(shown, panel);
-        QCOMPARE(status->_modeStatus->text(), afterLock);
+        QTRY_COMPARE(status->_modeStatus->text(), afterLock);
     }
 
     // The window hands the device record to these pages at once, shown or not.
@@ -346,6 +367,99 @@ private slots:
         QVERIFY(!routed());
         window->action_Modules->trigger();
         QVERIFY(routed());
+    }
+
+    // Phone Information scrolls in a small window and shows every value in full.
+    void phoneInformationScrolls()
+    {
+        DeviceWindow* window = openWindow("aurora");
+        QLabel* model = window->_phoneInfoWidget->_model;
+        QCOMPARE(model->text(), QString("Aurora Reference Simulator"));
+        QTRY_VERIFY(model->width() >= model->sizeHint().width());
+        window->resize(800, 500);
+        auto* area = window->_phoneInfoWidget->findChild<QScrollArea*>();
+        QTRY_VERIFY(area && area->verticalScrollBar()->maximum() > 0);
+    }
+
+    // A paused device: the dialogs and the indicator ask it off the GUI thread, which never
+    // stalls for a whole call timeout; each says why its call failed, and the window counts the
+    // device as gone until it answers again.
+    void pausedDeviceNeverHoldsTheGui()
+    {
+        DeviceConnection::setCallTimeoutMs(1500);
+        SimulatorProcess simulator(m_sockets.path());
+        QVERIFY(simulator.connectDevice(SimulatorProcess::sampleImage("simulator"), "paused"));
+        DeviceWindow* window = openWindow("paused");
+        QTRY_VERIFY(!indicator(window)->isBusy());
+        simulator.pause();
+        QElapsedTimer clock;
+        qint64 last = 0, longest = 0;
+        QTimer heartbeat;
+        connect(&heartbeat, &QTimer::timeout, this, [&] {
+            longest = std::max(longest, clock.elapsed() - last);
+            last = clock.elapsed();
+        });
+        clock.start();
+        heartbeat.start(5);
+        QPointer<ModuleInfoDialog> info = new ModuleInfoDialog;
+        info->openDeviceModule("paused", ModuleInfo());
+        SecuritySettingsDialog security;
+        security.setDevice("paused");
+        indicator(window)->setDevice("paused");
+        QTRY_VERIFY_WITH_TIMEOUT(!info->isBusy() && !security._securitySettings->isBusy(), 10000);
+        QTRY_COMPARE_WITH_TIMEOUT(statusText(window), QString("Device disconnected"), 10000);
+        QVERIFY2(longest < DeviceConnection::callTimeoutMs(), qPrintable(QString::number(longest)));
+        const QString failure = "Error 1002: the device did not answer in time";
+        QCOMPARE(QStringList({info->message(), security._securitySettings->_unlockModeLabel->text()}), QStringList({failure, failure}));
+        simulator.resume();
+        QTRY_VERIFY_WITH_TIMEOUT(window->deviceConnected(), 15000);
+        DeviceConnection::setCallTimeoutMs(Protocol::CallTimeoutMs);
+        delete info;
+    }
+
+    // A device that goes away: the window says so, greys its pages, keeps their data without
+    // error texts and takes no device action. The same id back: the pages ask again without
+    // the window being reopened; so does Refresh, and a page whose data an action changed.
+    void goneAndBack()
+    {
+        SimulatorProcess simulator(m_sockets.path());
+        const QString image = SimulatorProcess::sampleImage("simulator");
+        QVERIFY(simulator.connectDevice(image, "returning"));
+        DeviceWindow* window = openWindow("returning");
+        window->action_Modules->trigger();
+        QTRY_COMPARE_WITH_TIMEOUT(window->_moduleListView->status(), QString("Ready"), 20000);
+        const int modules = window->_moduleListView->_moduleTable->rowCount();
+        QPointer<ModuleListView> page = window->_moduleListView;
+        simulator.kill();
+        QTRY_COMPARE_WITH_TIMEOUT(statusText(window), QString("Device disconnected"), 15000);
+        QCOMPARE(indicator(window)->_modeStatus->text(), QString("Disconnected"));
+        QVERIFY(!window->_stackedWidget->isEnabled() && !indicator(window)->isEnabled()
+                && !window->action_Security_Settings->isEnabled() && !window->actionExport_to_XML->isEnabled());
+        QCOMPARE(page->_moduleTable->rowCount(), modules);
+        for (const QLabel* label : window->_phoneInfoWidget->findChildren<QLabel*>())
+            QVERIFY2(!label->text().contains("Error") && !label->text().contains("not found"), qPrintable(label->text()));
+
+        QVERIFY(simulator.start(image, "returning"));
+        QTRY_VERIFY_WITH_TIMEOUT(window->deviceConnected(), 15000);
+        QVERIFY(!page && window->_stackedWidget->isEnabled());
+        QTRY_COMPARE_WITH_TIMEOUT(window->_moduleListView->status(), QString("Ready"), 20000);
+        QCOMPARE(window->_moduleListView->_moduleTable->rowCount(), modules);
+        QCOMPARE(window->_phoneInfoWidget->_model->text(), QString("Aurora Reference Simulator"));
+        QTRY_VERIFY(indicator(window)->isEnabled());
+
+        page = window->_moduleListView;
+        for (QAction* action : window->menu_View->actions()) {
+            if (action->shortcut() == QKeySequence(QKeySequence::Refresh))
+                action->trigger();
+        }
+        QVERIFY(!page);
+        QTRY_COMPARE_WITH_TIMEOUT(window->_moduleListView->status(), QString("Ready"), 20000);
+        window->action_Phone_Information->trigger();
+        page = window->_moduleListView;
+        emit window->_deviceFSView->deviceContentChanged();
+        QVERIFY(page);
+        window->action_Modules->trigger();
+        QVERIFY(!page);
     }
 };
 

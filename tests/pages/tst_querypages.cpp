@@ -110,6 +110,29 @@ QVector<ProcessInfo> changed(int change)
 }
 
 
+// A live page fed by hand, so that a test can list an id again.
+class ListedPage : public LiveTreePage
+{
+public:
+    QTreeWidget tree;
+    LiveSnapshot<ProcessInfo> snapshot;
+
+    ListedPage() { setTree(&tree, 1); }
+    // Every list offered counts as a change; the next tick merges it.
+    void offer(const QVector<ProcessInfo>& list)
+    {
+        snapshot.offer(list, [](const auto&, const auto&) { return false; });
+    }
+    QString componentName() override { return "Listed"; }
+
+protected:
+    PageWorkerThread* createWorker(const QSharedPointer<_ZantDevice>&) override { return nullptr; }
+    Poll mergeSnapshot() override
+    {
+        return mergeFrom(snapshot, &ProcessInfo::threads, [](QTreeWidgetItem*, const ThreadEntry&) {});
+    }
+};
+
 enum RegistryColumn { ClassTypeColumn, ClassHandlerColumn, FlagsColumn, MimeTypeColumn };
 enum ModuleColumn { NameColumn, VersionColumn, TypeColumn, SignatureColumn, PathColumn, CopyrightColumn };
 
@@ -279,6 +302,25 @@ private slots:
         QCOMPARE(snapshot.offer(changed(change), byIds), !same);
         QCOMPARE(snapshot.take(taken), !same);
         QCOMPARE(taken, changed(same ? 0 : change));
+    }
+
+    // An id listed again while its row is marked gone gets its row back, shown, and the row
+    // outlives the aging that would have removed it: a process and an entry.
+    void goneRowsReturnWithTheirIds()
+    {
+        ListedPage page;
+        const auto step = [&page](int change, int ticks) {
+            page.offer(changed(change));
+            tick(page, ticks);
+            return lives(&page.tree);
+        };
+        QCOMPARE(step(0, Page::AgingTicks + 1), QStringList(4, "shown black"));
+        QCOMPARE(step(5, 1), QStringList({"shown black", "shown black", "shown black", "gone 1 black"}));
+        QCOMPARE(step(2, 1), QStringList({"shown black", "shown black", "gone 1 red", "new 1 green", "shown black"}));
+        QCOMPARE(step(0, 1), QStringList({"shown black", "shown black", "shown black", "gone 1 red", "shown black"}));
+        tick(page, Page::AgingTicks + 1);
+        QCOMPARE(lives(&page.tree), QStringList(4, "shown black"));
+        QCOMPARE(page.tree.topLevelItem(1)->data(0, Page::IdRole).toUInt(), 20u);
     }
 
     // New rows are green for five ticks and black at the sixth; two pages of one device age

@@ -225,23 +225,26 @@ private slots:
         QCOMPARE(caption, QString("Save fileodd.xml"));
     }
 
-    // Nothing to show leaves the view empty, without a message; the title still names the
-    // module. Of files, only one that cannot be read is refused, keeping what a view showed.
+    // Nothing to show leaves the view empty; a device's failure is said above it with its code.
+    // The title still names the module. Of files, only one that cannot be read is refused,
+    // keeping what a view showed.
     void failuresLeaveTheViewEmpty_data()
     {
         QTest::addColumn<QString>("device");  // none: a file on disk
         QTest::addColumn<QString>("path");
         QTest::addColumn<bool>("read");
-        QTest::newRow("not a MIF") << "" << m_files.filePath("garbage.mif") << false;
-        QTest::newRow("MIF without a module") << "" << m_files.filePath("empty.mif") << true;
-        QTest::newRow("unknown device") << "nobody" << OddModulePath << false;
-        QTest::newRow("module the device lacks") << DeviceId << "/usermod/none/none.mif" << false;
+        QTest::addColumn<QString>("message");  // how it starts
+        QTest::newRow("not a MIF") << "" << m_files.filePath("garbage.mif") << false << "";
+        QTest::newRow("MIF without a module") << "" << m_files.filePath("empty.mif") << true << "";
+        QTest::newRow("unknown device") << "nobody" << OddModulePath << false << "Error 1001: the device is not connected";
+        QTest::newRow("module the device lacks") << DeviceId << "/usermod/none/none.mif" << false << "Error 1102";
     }
     void failuresLeaveTheViewEmpty()
     {
         QFETCH(QString, device);
         QFETCH(QString, path);
         QFETCH(bool, read);
+        QFETCH(QString, message);
         ModuleInfoDialog dialog;
         if (device.isEmpty()) {
             ModuleInfoView view;
@@ -255,7 +258,10 @@ private slots:
             module.name = "odd";
             module.path = path;
             dialog.openDeviceModule(device, module);
+            QTRY_VERIFY(!dialog.isBusy());
         }
+        QVERIFY2(message.isEmpty() ? dialog.message().isEmpty() : dialog.message().startsWith(message),
+                 qPrintable(dialog.message()));
         QCOMPARE(dialog.windowTitle(), QString("Module Info odd"));
         QCOMPARE(viewLines(dialog._moduleInfoView), QStringList());
     }
@@ -269,8 +275,14 @@ private slots:
         first->resize(520, 310);
         first->close();
         QTRY_VERIFY(first.isNull());
-        ModuleInfoDialog dialog;
-        QCOMPARE(QRect(dialog.pos(), dialog.size()), QRect(40, 40, 520, 310));
+        // Reopened, it stands where it was closed: it does not walk.
+        for (int opening = 0; opening < 2; ++opening) {
+            QPointer<ModuleInfoDialog> dialog = new ModuleInfoDialog;
+            QCOMPARE(QRect(dialog->pos(), dialog->size()), QRect(40, 40, 520, 310));
+            dialog->show();
+            dialog->close();
+            QTRY_VERIFY(dialog.isNull());
+        }
     }
 
     // A double-click in the device window's module list opens the module's own information.
@@ -292,7 +304,7 @@ private slots:
         ModuleInfoDialog* dialog = theOpenDialog();
         QVERIFY(dialog);
         QCOMPARE(dialog->windowTitle(), QString("Module Info odd"));
-        QCOMPARE(viewLines(dialog->_moduleInfoView), OddModuleLines);
+        QTRY_COMPARE(viewLines(dialog->_moduleInfoView), OddModuleLines);
     }
 
     // A device file's copy on this computer opens: one whose complete suffix is "mif", in
