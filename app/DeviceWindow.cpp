@@ -8,6 +8,7 @@
 #include "PrivateTempFolder.h"
 #include "SaveXmlReport.h"
 #include "SecuritySettingsDialog.h"
+#include "SnapshotActions.h"
 
 #include <QActionGroup>
 #include <QCloseEvent>
@@ -89,6 +90,8 @@ DeviceWindow::DeviceWindow(QWidget* parent)
     connect(actionE_xit, &QAction::triggered, this, &QWidget::close);
     connect(_toolbar, &QToolBar::actionTriggered, this, &DeviceWindow::onToolbarActionTriggered);
     connect(actionExport_to_XML, &QAction::triggered, this, &DeviceWindow::onWriteXMLFile);
+    connect(_actionSaveSnapshot, &QAction::triggered, this, &DeviceWindow::onSaveSnapshot);
+    connect(_actionCompareWithSnapshot, &QAction::triggered, this, &DeviceWindow::onCompareWithSnapshot);
     connect(action_Security_Settings, &QAction::triggered, this, &DeviceWindow::onActionSecuritySettingsTriggered);
     _stackedWidget->setCurrentIndex(0);
 
@@ -372,4 +375,16 @@ void DeviceWindow::closeEvent(QCloseEvent* event)
     }
     deleteLater();
     event->accept();
+}
+
+void DeviceWindow::onSaveSnapshot()
+{
+    if (m_device)
+        SnapshotActions::save(this, m_device, m_deviceId);
+}
+
+void DeviceWindow::onCompareWithSnapshot()
+{
+    if (m_device)
+        SnapshotActions::compare(this, m_device, m_deviceId);
 }

@@ -45,6 +45,8 @@ public slots:
     void onModuleInfoExamine(ModuleInfo displayMe);
     void onTimedStatusExpire();
     void onWriteXMLFile();
+    void onSaveSnapshot();
+    void onCompareWithSnapshot();
 
 protected:
     void closeEvent(QCloseEvent* event) override;

@@ -2,9 +2,10 @@
 
 #include "CITreeWidgetItem.h"
 #include "DeviceCache.h"
+#include "DisplayText.h"
 #include "FamilyGrouping.h"
 #include "LevelFiles.h"
-#include "LevelReport.h"
+#include "LevelCheck.h"
 #include "NameLibrary.h"
 
 #include <QFileInfo>
@@ -113,7 +114,7 @@ void LevelViewWidget::onCurrentLevelChanged(int index)
 
     QList<IdRecord> entries;
     QString error;
-    if (!LevelReport::check(path, m_record->classes, &entries, &error)) {
+    if (!LevelCheck::check(path, m_record->classes, &entries, &error)) {
         setStatus(QStringLiteral("Level file not found"));
         setState(Failed);
         return;
@@ -152,7 +153,7 @@ void LevelViewWidget::insertEntry(const IdRecord& entry)
     auto* item = new CITreeWidgetItem;
     item->setText(NameColumn, entry.name);
     item->setText(IdColumn, entry.id);
-    item->setText(ResultColumn, LevelReport::resultText(entry));
+    item->setText(ResultColumn, DisplayText::levelResult(entry.available));
     item->setForeground(ResultColumn, QBrush(entry.available ? Qt::green : Qt::red));
     subFamily->addChild(item);
 }

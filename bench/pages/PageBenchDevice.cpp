@@ -35,12 +35,12 @@ QString simulatorPath()
     return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim");
 }
 
-bool generateImage(const QString& image, int modules, int classes)
+bool generateImage(const QString& image, int modules, int classes, int files)
 {
     const int result = QProcess::execute(simulatorPath(), {QStringLiteral("generate"), image, QStringLiteral("--modules"),
                                                            QString::number(modules), QStringLiteral("--classes"),
                                                            QString::number(classes), QStringLiteral("--files"),
-                                                           QStringLiteral("0"), QStringLiteral("--processes"),
+                                                           QString::number(files), QStringLiteral("--processes"),
                                                            QStringLiteral("0")});
     return result == 0;
 }
@@ -60,10 +60,11 @@ QSharedPointer<_ZantDevice> connectDevice(const QString& id)
     return nullptr;
 }
 
-QSharedPointer<_ZantDevice> serveGeneratedDevice(QProcess& server, const QTemporaryDir& work, int modules, int classes)
+QSharedPointer<_ZantDevice> serveGeneratedDevice(QProcess& server, const QTemporaryDir& work, int modules, int classes,
+                                                 int files)
 {
     const QString image = work.filePath(QStringLiteral("image"));
-    if (!work.isValid() || !generateImage(image, modules, classes)) {
+    if (!work.isValid() || !generateImage(image, modules, classes, files)) {
         std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulatorPath()));
         return {};
     }
