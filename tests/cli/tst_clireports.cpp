@@ -134,8 +134,11 @@ private slots:
             {"family-tree", "familyTree"}, {"registry", "registrylist"}, {"settings", "settings"}, {"processes", "processes"},
             {"loaded-modules", "loaded-modules"}};
         for (const QString device : {"kestrel-k7", "aurora-sim"}) {
-            for (const auto& [command, schema] : commands)
-                QTest::addRow("%s %s", qPrintable(command), qPrintable(device)) << QStringList {command, device} << schema;
+            for (const auto& [command, schema] : commands) {
+                // The simulator's processes come and go between two runs; the handset's stay.
+                if (device == "kestrel-k7" || !command.contains("process") && !command.startsWith("loaded"))
+                    QTest::addRow("%s %s", qPrintable(command), qPrintable(device)) << QStringList {command, device} << schema;
+            }
             QTest::addRow("level %s", qPrintable(device)) << QStringList {"level", device, "Level-1"} << "levelreport";
         }
         QTest::newRow("ls") << QStringList {"ls", "kestrel-k7", "/user"} << "folder";
