@@ -6,6 +6,8 @@
 #include <QTableWidget>
 #include <QVBoxLayout>
 
+#include <algorithm>
+
 namespace {
 
 enum Column
@@ -17,6 +19,8 @@ enum Column
     AfterColumn,
     ColumnCount
 };
+
+constexpr int MaximumColumnWidth = 300;
 
 QColor changeColour(SnapshotDiff::Change change)
 {
@@ -66,9 +70,11 @@ SnapshotDiffDialog::SnapshotDiffDialog(const SnapshotDiff& difference, const QSt
         }
         ++row;
     }
+    // A hash would push the device's column out of sight: long texts are cut, whole in the tool tip.
     m_table->resizeColumnsToContents();
+    for (int column = 0; column < ColumnCount; ++column)
+        m_table->setColumnWidth(column, std::min(m_table->columnWidth(column), MaximumColumnWidth));
     m_table->horizontalHeader()->setStretchLastSection(true);
-    m_table->setSortingEnabled(true);
     layout->addWidget(m_table);
 
     auto* buttons = new QDialogButtonBox(QDialogButtonBox::Close, this);
