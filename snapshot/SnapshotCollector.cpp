@@ -22,30 +22,6 @@
 
 namespace {
 
-// The settings store depth first from the root, each node before its children; a node
-// met twice (a device naming an ancestor as a child) is read once.
-int settingsNodes(_ZantDevice& device, QVector<_SettingsInfo>* nodes, QString* failed)
-{
-    QStringList pending {QStringLiteral("/")};
-    QSet<QString> seen;
-    while (!pending.isEmpty()) {
-        const QString path = pending.takeLast();
-        if (seen.contains(path))
-            continue;
-        seen.insert(path);
-        auto node = QSharedPointer<_SettingsInfo>::create();
-        node->SetPath(path);
-        if (const int result = device.GetChildSettings(node)) {
-            *failed = QStringLiteral("the settings at %1").arg(path);
-            return result;
-        }
-        for (auto child = node->children.crbegin(); child != node->children.crend(); ++child)
-            pending.append((*child)->Path());
-        nodes->append(*node);
-    }
-    return 0;
-}
-
 QByteArray contentHash(_ZantDevice& device, const QString& path, const QTemporaryDir& scratch, int* result)
 {
     const QString local = scratch.filePath(QStringLiteral("content"));
@@ -105,6 +81,28 @@ int listVolume(_ZantDevice& device, const VolumeInfo& volume, const QSet<QString
 }
 
 } // namespace
+
+int SnapshotCollector::settingsNodes(_ZantDevice& device, QVector<_SettingsInfo>* nodes, QString* failed)
+{
+    QStringList pending {QStringLiteral("/")};
+    QSet<QString> seen;
+    while (!pending.isEmpty()) {
+        const QString path = pending.takeLast();
+        if (seen.contains(path))
+            continue;
+        seen.insert(path);
+        auto node = QSharedPointer<_SettingsInfo>::create();
+        node->SetPath(path);
+        if (const int result = device.GetChildSettings(node)) {
+            *failed = QStringLiteral("the settings at %1").arg(path);
+            return result;
+        }
+        for (auto child = node->children.crbegin(); child != node->children.crend(); ++child)
+            pending.append((*child)->Path());
+        nodes->append(*node);
+    }
+    return 0;
+}
 
 int SnapshotCollector::collect(_ZantDevice& device, const QString& deviceId, qint64 hashLimit, QJsonObject* snapshot,
                                QString* failedStep, PortlexProgressCallback callback, void* context)

@@ -1,9 +1,11 @@
 #pragma once
 
 #include "ProgressCallback.h"
+#include "_SettingsInfo.h"
 
 #include <QJsonObject>
 #include <QString>
+#include <QVector>
 
 class _ZantDevice;
 
@@ -24,4 +26,9 @@ public:
                        QString* failedStep, PortlexProgressCallback callback = nullptr, void* context = nullptr);
 
     static constexpr int Steps = 8;
+
+    // The settings store depth first from the root, each node before its children, children
+    // in device order; a node met twice (a device naming an ancestor as a child) is read
+    // once. Returns 0, or the failing call's code with *failed naming the node.
+    static int settingsNodes(_ZantDevice& device, QVector<_SettingsInfo>* nodes, QString* failed);
 };
