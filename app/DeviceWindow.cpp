@@ -9,6 +9,7 @@
 #include "SaveXmlReport.h"
 #include "SecuritySettingsDialog.h"
 #include "WindowCascade.h"
+#include "SnapshotActions.h"
 
 #include <QActionGroup>
 #include <QApplication>
@@ -124,6 +125,8 @@ DeviceWindow::DeviceWindow(QWidget* parent)
     connect(actionE_xit, &QAction::triggered, this, &QWidget::close);
     connect(_toolbar, &QToolBar::actionTriggered, this, &DeviceWindow::onToolbarActionTriggered);
     connect(actionExport_to_XML, &QAction::triggered, this, &DeviceWindow::onWriteXMLFile);
+    connect(_actionSaveSnapshot, &QAction::triggered, this, &DeviceWindow::onSaveSnapshot);
+    connect(_actionCompareWithSnapshot, &QAction::triggered, this, &DeviceWindow::onCompareWithSnapshot);
     connect(action_Security_Settings, &QAction::triggered, this, &DeviceWindow::onActionSecuritySettingsTriggered);
     _stackedWidget->setCurrentIndex(0);
 
@@ -598,4 +601,16 @@ void DeviceWindow::onDeviceContentChanged()
         if (index != _stackedWidget->currentIndex())
             m_staleSlots.insert(index);
     }
+}
+
+void DeviceWindow::onSaveSnapshot()
+{
+    if (m_device)
+        SnapshotActions::save(this, m_device, m_deviceId);
+}
+
+void DeviceWindow::onCompareWithSnapshot()
+{
+    if (m_device)
+        SnapshotActions::compare(this, m_device, m_deviceId);
 }

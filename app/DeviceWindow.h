@@ -73,6 +73,8 @@ public slots:
     // What the device holds has changed (an install, a delete, a run): the pages that show
     // it ask again when they are next shown.
     void onDeviceContentChanged();
+    void onSaveSnapshot();
+    void onCompareWithSnapshot();
 
 protected:
     void closeEvent(QCloseEvent* event) override;

@@ -5,7 +5,9 @@
 #include "FileCommands.h"
 #include "Portlex.h"
 #include "PortlexErrors.h"
+#include "ProgressLine.h"
 #include "SafeOutputFile.h"
+#include "SnapshotCommands.h"
 #include "ToolCommands.h"
 
 #include <QCoreApplication>
@@ -24,38 +26,14 @@ void writeOut(FILE* stream, const QString& text)
     std::fflush(stream);
 }
 
-// What the gateway's own codes mean; a device's own codes have no name here.
-QString codeMeaning(int code)
-{
-    switch (code) {
-    case PortlexError::NotConnected: return QStringLiteral("the device is not connected");
-    case PortlexError::Timeout: return QStringLiteral("the device did not answer in time");
-    case PortlexError::Unreachable: return QStringLiteral("the device is not reachable");
-    case PortlexError::ProtocolError: return QStringLiteral("the device's answer was malformed");
-    case PortlexError::VersionMismatch: return QStringLiteral("the device speaks another protocol version");
-    case PortlexError::InvalidArgument: return QStringLiteral("invalid argument");
-    case PortlexError::LocalFileError: return QStringLiteral("the file on this computer could not be read or written");
-    case PortlexError::Untrusted: return QStringLiteral("the device's socket is not the user's own");
-    case PortlexError::Cancelled: return QStringLiteral("cancelled");
-    case PortlexError::BadRequest: return QStringLiteral("the device could not read the request");
-    case PortlexError::PathRefused: return QStringLiteral("the path is refused");
-    case PortlexError::NotFound: return QStringLiteral("not found");
-    case PortlexError::NoSpace: return QStringLiteral("not enough free space on the volume");
-    case PortlexError::IoError: return QStringLiteral("the device could not read or write its file");
-    case PortlexError::UnknownOperation: return QStringLiteral("the device does not know the operation");
-    case PortlexError::Refused: return QStringLiteral("the device refuses the request");
-    case PortlexError::NotRunnable: return QStringLiteral("not a .mod file");
-    case PortlexError::IsDirectory: return QStringLiteral("the path is a directory");
-    case PortlexError::TransferIncomplete: return QStringLiteral("the transfer ended incomplete");
-    default: return QString();
-    }
-}
-
 const char* const OptionsHelp =
     "Options:\n"
-    "  --format xml|json|csv   output format (default xml: the document the window exports)\n"
+    "  --format xml|json|csv   output format (default xml: the document the window exports);\n"
+    "                          level also takes junit\n"
     "  -o, --output FILE       write the output to FILE instead of standard output\n"
-    "  --fail-on-difference    compare: exit 1 when a class is in one scan only\n"
+    "  --csv-raw               CSV: write text cells exactly as the device gave them\n"
+    "  --fail-on-difference    compare, diff: exit 1 when the two differ\n"
+    "  --hash-limit BYTES      snapshot: hash the content of files up to this size\n"
     "  --volume ID|MOUNT       install: the volume to install to (default: the first)\n"
     "  -h, --help              this help, or a command's help\n"
     "\n"
@@ -63,16 +41,27 @@ const char* const OptionsHelp =
     "-o and pull replace only a regular file: a link or a device node there is refused.\n"
     "XML writes characters it cannot carry as {U+XXXX} (\"{U+\" itself as {U+007B}U+).\n"
     "\n"
-    "Exit status: 0 success; 1 the level is not met, or the scans differ (with\n"
-    "--fail-on-difference); 2 usage error; 3 no such device, or it refused the connection;\n"
-    "4 a gateway or file error.\n";
+    "JSON output is one object naming its schema and version (\"schema\": \"delvix.modules\",\n"
+    "\"version\": 1); the schemas are in share/delvix/schema/. CSV has the page's column\n"
+    "titles and order. A CSV text cell that a spreadsheet would evaluate as a formula (one\n"
+    "starting with =, +, -, @, a tab or a carriage return) is written with a leading ' so\n"
+    "that it shows as text; --csv-raw keeps it as it is.\n"
+    "\n"
+    "Exit status:\n"
+    "  0  success\n"
+    "  1  check failed: the level is not met, or (with --fail-on-difference) the scans or\n"
+    "     snapshots differ\n"
+    "  2  usage error: unknown command, option, level or volume, or a name matching several\n"
+    "  3  device unavailable: no such device, or it refused the connection\n"
+    "  4  gateway or file error: a device call failed, or a file here could not be read or\n"
+    "     written (a corrupt snapshot, an unreadable level, an -o file)\n";
 
 } // namespace
 
 Cli::Cli(const QStringList& arguments)
     : m_arguments(arguments)
 {
-    m_commands = deviceReportCommands() + deviceStateCommands() + fileCommands() + toolCommands();
+    m_commands = deviceReportCommands() + deviceStateCommands() + fileCommands() + toolCommands() + snapshotCommands();
 }
 
 int Cli::run()
@@ -108,9 +97,18 @@ int Cli::run()
             helpAsked = true;
         } else if (name == QLatin1String("--fail-on-difference")) {
             m_failOnDifference = true;
+        } else if (name == QLatin1String("--csv-raw")) {
+            m_csvCells = Report::CsvCells::Raw;
+        } else if (name == QLatin1String("--hash-limit")) {
+            bool ok = false;
+            if (!takeValue() || (m_hashLimit = value.toLongLong(&ok)) < 0 || !ok)
+                return usage(QStringLiteral("--hash-limit takes a size in bytes"));
         } else if (name == QLatin1String("--format")) {
-            if (!takeValue() || !Report::parseFormat(value, &m_format))
-                return usage(QStringLiteral("--format takes xml, json or csv"));
+            if (!takeValue())
+                return usage(QStringLiteral("--format takes xml, json, csv or (level) junit"));
+            m_junit = value == QLatin1String("junit");
+            if (!m_junit && !Report::parseFormat(value, &m_format))
+                return usage(QStringLiteral("--format takes xml, json, csv or (level) junit"));
         } else if (name == QLatin1String("-o") || name == QLatin1String("--output")) {
             if (!takeValue() || value.isEmpty())
                 return usage(QStringLiteral("%1 takes a file name").arg(name));
@@ -136,6 +134,8 @@ int Cli::run()
     const CliCommand* command = find(name);
     if (!command)
         return usage(QStringLiteral("unknown command \"%1\"").arg(name));
+    if (m_junit && command->name != QLatin1String("level"))
+        return usage(QStringLiteral("--format junit is for level only"));
     if (helpAsked)
         return help(command);
     if (positional.size() < command->minArguments || positional.size() > command->maxArguments) {
@@ -211,14 +211,24 @@ QSharedPointer<_ZantDevice> Cli::connect(const QString& spec, int* exitCode)
         id = matches.first();
     const QSharedPointer<_ZantDevice> device = id.isEmpty() ? QSharedPointer<_ZantDevice>() : Portlex::GetDevice(id);
     if (!device) {
-        *exitCode = fail(ExitNoDevice, QStringLiteral("no device \"%1\" (\"%2 devices\" lists them)").arg(spec, QLatin1String(ToolName)));
+        *exitCode = fail(ExitDeviceUnavailable, QStringLiteral("no device \"%1\" (\"%2 devices\" lists them)").arg(spec, QLatin1String(ToolName)));
         return {};
     }
     int code = 0;
     QString reason;
     if (!Portlex::ConnectDevice(device, QString(), QString(), &code, &reason)) {
-        *exitCode = fail(ExitNoDevice, QStringLiteral("%1 refused the connection: error %2 %3").arg(id).arg(code).arg(reason));
+        const QString meaning = PortlexError::describe(code);
+        *exitCode = fail(ExitDeviceUnavailable, QStringLiteral("%1 refused the connection: error %2%3 %4")
+                                                    .arg(id)
+                                                    .arg(code)
+                                                    .arg(meaning.isEmpty() ? QString() : QStringLiteral(" (%1)").arg(meaning))
+                                                    .arg(reason));
         return {};
+    }
+    m_deviceId = id;
+    for (const auto& known : std::as_const(devices)) {
+        if (known.second == id)
+            m_deviceName = known.first;
     }
     *exitCode = ExitSuccess;
     return device;
@@ -231,23 +241,30 @@ int Cli::onDevice(const QString& spec, const std::function<int(_ZantDevice& devi
     return device ? work(*device) : status;
 }
 
-int Cli::emitReport(const Report& report)
+int Cli::emitReport(Report report)
 {
-    const QByteArray bytes = report.write(m_format);
+    if (!m_deviceId.isEmpty())
+        report.setDevice(m_deviceId, m_deviceName);
+    return writeOutput(report.write(m_format, m_csvCells));
+}
+
+int Cli::writeOutput(const QByteArray& bytes)
+{
     if (m_output.isEmpty()) {
         if (std::fwrite(bytes.constData(), 1, size_t(bytes.size()), stdout) != size_t(bytes.size()) || std::fflush(stdout) != 0)
-            return fail(ExitGatewayError, QStringLiteral("could not write the output"));
+            return fail(ExitGatewayOrFileError, QStringLiteral("could not write the output"));
         return ExitSuccess;
     }
     SafeOutputFile file(m_output);
     if (!file.open() || !file.write(bytes) || !file.commit())
-        return fail(ExitGatewayError, QStringLiteral("could not write %1: %2").arg(m_output, file.errorString()));
+        return fail(ExitGatewayOrFileError, QStringLiteral("could not write %1: %2").arg(m_output, file.errorString()));
     return ExitSuccess;
 }
 
 int Cli::fail(int code, const QString& message)
 {
-    endProgress();
+    if (m_progressLine)
+        m_progressLine->end();
     writeOut(stderr, QStringLiteral("%1: %2\n").arg(QLatin1String(ToolName), message));
     return code;
 }
@@ -255,36 +272,11 @@ int Cli::fail(int code, const QString& message)
 int Cli::gatewayFailure(const QString& what, int code, const QString& reason)
 {
     QString message = QStringLiteral("%1 failed: error %2").arg(what).arg(code);
-    const QString meaning = codeMeaning(code);
+    const QString meaning = PortlexError::describe(code);
     if (!meaning.isEmpty())
         message += QStringLiteral(" (%1)").arg(meaning);
     if (!reason.isEmpty())
         message += QStringLiteral(": ") + reason;
-    return fail(ExitGatewayError, message);
+    return fail(ExitGatewayOrFileError, message);
 }
 
-bool Cli::progress(void* context, int value, int maximum, const QString& text)
-{
-    auto* cli = static_cast<Cli*>(context);
-    if (!cli->m_progressToTerminal)
-        return false;
-    if (value < 0) {
-        cli->m_progressMaximum = maximum;
-        return false;
-    }
-    QString line = cli->m_progressMaximum > 0 ? QStringLiteral("%1/%2").arg(value).arg(cli->m_progressMaximum)
-                                              : QString::number(value);
-    if (!text.isEmpty())
-        line += QLatin1Char(' ') + text;
-    // One line, rewritten in place; the erase clears the rest of a longer earlier text.
-    writeOut(stderr, QStringLiteral("\r\x1b[K") + line);
-    cli->m_progressShown = true;
-    return false;
-}
-
-void Cli::endProgress()
-{
-    if (m_progressShown)
-        writeOut(stderr, QStringLiteral("\n"));
-    m_progressShown = false;
-}

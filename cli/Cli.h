@@ -10,6 +10,7 @@
 
 #include <functional>
 
+class ProgressLine;
 class _ZantDevice;
 
 // The command line tool: reads the arguments, runs one command and gives its exit status.
@@ -24,26 +25,36 @@ public:
     // Options the commands read.
     bool failOnDifference() const { return m_failOnDifference; }
     QString volume() const { return m_volume; }
+    Report::Format format() const { return m_format; }
+    // --format junit (level only).
+    bool junit() const { return m_junit; }
+    // The connected device's id.
+    QString deviceId() const { return m_deviceId; }
+    QString output() const { return m_output; }
+    // snapshot: files up to this size get a content hash; -1: none.
+    qint64 hashLimit() const { return m_hashLimit; }
 
     // Runs work on the device that spec names (its id, or a unique part of its display
     // name) once it is connected. The exit status is work's, or says how finding or
     // connecting the device failed.
     int onDevice(const QString& spec, const std::function<int(_ZantDevice& device)>& work);
 
-    // Writes the report in the chosen format to the output: standard output, or the -o
-    // file through a SafeOutputFile (never through a link, never over a device node).
-    // Returns the exit status.
-    int emitReport(const Report& report);
-    // A message on the error stream; returns code.
+    // Writes the report in the chosen format, with the connected device's identity, to
+    // the output. Returns the exit status.
+    int emitReport(Report report);
+    // Writes bytes to the output: standard output, or the -o file through a SafeOutputFile
+    // (never through a link, never over a device node). Returns the exit status.
+    int writeOutput(const QByteArray& bytes);
+    // A message on the error stream, ending an open progress line first; returns code.
     int fail(int code, const QString& message);
-    // A failed gateway call: its code and the call's reason. Returns ExitGatewayError.
+    // A failed gateway call: its code, what the code means and the call's reason.
+    // Returns ExitGatewayOrFileError.
     int gatewayFailure(const QString& what, int code, const QString& reason);
 
-    // Progress on the error stream, when that is a terminal; the gateway's callback form,
-    // with this tool as context. Never asks to stop.
-    static bool progress(void* context, int value, int maximum, const QString& text);
-    // Ends the progress line, if one is shown.
-    void endProgress();
+    // Whether progress is shown: only when the error stream is a terminal.
+    bool progressToTerminal() const { return m_progressToTerminal; }
+    // The progress line in force, ended by fail(); ProgressLine registers itself.
+    void setProgressLine(ProgressLine* line) { m_progressLine = line; }
 
 private:
     int usage(const QString& message);
@@ -57,10 +68,13 @@ private:
     QStringList m_arguments;
     QString m_output;
     QString m_volume;
+    QString m_deviceId;
+    QString m_deviceName;
     Report::Format m_format = Report::Format::Xml;
+    Report::CsvCells m_csvCells = Report::CsvCells::Guarded;
+    qint64 m_hashLimit = -1;
     bool m_failOnDifference = false;
-    // Progress state: the range in force and whether a line is open on the terminal.
-    int m_progressMaximum = 0;
-    bool m_progressShown = false;
+    bool m_junit = false;
     bool m_progressToTerminal = false;
+    ProgressLine* m_progressLine = nullptr;
 };

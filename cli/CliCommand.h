@@ -6,14 +6,14 @@
 
 class Cli;
 
-// What a pipeline can tell from the exit status.
+// What a pipeline can tell from the exit status. The numbers are an interface: they never change.
 enum ExitCode : int
 {
     ExitSuccess = 0,
-    ExitFinding = 1,        // the level is not met, or the scans differ (when asked to fail on it)
-    ExitUsage = 2,
-    ExitNoDevice = 3,       // no such device, or it refused the connection
-    ExitGatewayError = 4,   // a gateway call or a local file failed
+    ExitCheckFailed = 1,        // the level is not met, or the scans or snapshots differ (when asked to fail on it)
+    ExitUsage = 2,              // bad arguments: an unknown command, option, level or volume, an ambiguous name
+    ExitDeviceUnavailable = 3,  // no such device, or it refused the connection
+    ExitGatewayOrFileError = 4, // a gateway call failed, or a file here could not be read or written
 };
 
 // One command of the tool: its name, how it is called and what it does.

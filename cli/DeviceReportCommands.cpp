@@ -5,7 +5,8 @@
 #include "DeviceListReport.h"
 #include "FamilyReport.h"
 #include "LevelFiles.h"
-#include "LevelReport.h"
+#include "LevelJUnit.h"
+#include "LevelCheck.h"
 #include "ModuleReport.h"
 #include "PhoneInfoReport.h"
 #include "Portlex.h"
@@ -129,13 +130,16 @@ int level(Cli& cli, const QStringList& arguments)
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) -> int {
         QList<IdRecord> entries;
         QString error;
-        if (!LevelReport::check(path, device.cache()->classes, &entries, &error))
-            return cli.fail(ExitGatewayError, QStringLiteral("cannot read the level %1: %2").arg(path, error));
-        const int written = cli.emitReport(FamilyReport::levelReport(FamilyReport::group(entries, LevelReport::cells)));
+        if (!LevelCheck::check(path, device.cache()->classes, &entries, &error))
+            return cli.fail(ExitGatewayOrFileError, QStringLiteral("cannot read the level %1: %2").arg(path, error));
+        const FamilyReport::Families families = FamilyReport::group(entries, LevelCheck::cells);
+        const int written = cli.junit()
+            ? cli.writeOutput(LevelJUnit::write(families, QFileInfo(path).completeBaseName(), cli.deviceId()))
+            : cli.emitReport(FamilyReport::levelReport(families));
         if (written != ExitSuccess)
             return written;
         const bool met = std::all_of(entries.cbegin(), entries.cend(), [](const IdRecord& entry) { return entry.available; });
-        return met ? ExitSuccess : ExitFinding;
+        return met ? ExitSuccess : ExitCheckFailed;
     });
 }
 
@@ -166,6 +170,8 @@ QVector<CliCommand> deviceReportCommands()
                         "and sub-family (grouped as \"family-tree\" groups them), \"Found\" or \"Not Found\".\n"
                         "LEVEL is a level of the Levels folder beside the program, named as the Level page\n"
                         "lists it, or the path of a level file.\n"
+                        "--format junit writes JUnit XML for CI: a test suite per family, a test case per\n"
+                        "class, a failure naming each class not found.\n"
                         "Exit status 1 when a class is not found (after writing the document), 2 for an\n"
                         "unknown level, 4 when the level file cannot be read."),
          2, 2, level},

@@ -4,6 +4,7 @@
 #include "LoadedModuleReport.h"
 #include "ProcessReport.h"
 #include "SettingsReport.h"
+#include "SnapshotCollector.h"
 #include "_ZantDevice.h"
 
 namespace {
@@ -11,19 +12,10 @@ namespace {
 int settings(Cli& cli, const QStringList& arguments)
 {
     return cli.onDevice(arguments.at(0), [&](_ZantDevice& device) {
-        // Depth first from the root, each node before its children, children in device order.
         QVector<_SettingsInfo> nodes;
-        QStringList pending {QStringLiteral("/")};
-        while (!pending.isEmpty()) {
-            auto node = QSharedPointer<_SettingsInfo>::create();
-            node->SetPath(pending.takeLast());
-            QString reason;
-            if (const int result = device.GetChildSettings(node, &reason))
-                return cli.gatewayFailure(QStringLiteral("reading the settings at %1").arg(node->Path()), result, reason);
-            for (auto child = node->children.crbegin(); child != node->children.crend(); ++child)
-                pending.append((*child)->Path());
-            nodes.append(*node);
-        }
+        QString failed;
+        if (const int result = SnapshotCollector::settingsNodes(device, &nodes, &failed))
+            return cli.gatewayFailure(QStringLiteral("reading ") + failed, result, QString());
         return cli.emitReport(SettingsReport::build(nodes));
     });
 }

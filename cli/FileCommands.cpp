@@ -2,13 +2,13 @@
 
 #include "Cli.h"
 #include "FolderReport.h"
+#include "ProgressLine.h"
 #include "_ZantDevice.h"
 
 #include <QDir>
 #include <QFileInfo>
 
 #include <algorithm>
-#include <cstdio>
 
 namespace {
 
@@ -30,9 +30,9 @@ int pull(Cli& cli, const QStringList& arguments)
         QString target = arguments.at(2);
         if (QFileInfo(target).isDir())
             target = QDir(target).filePath(source.mid(source.lastIndexOf(QLatin1Char('/')) + 1));
+        ProgressLine line(cli);
         QString reason;
-        const int result = device.CopyFileToPC(source, target, &Cli::progress, &cli, &reason);
-        cli.endProgress();
+        const int result = device.CopyFileToPC(source, target, &ProgressLine::report, &line, &reason);
         if (result)
             return cli.gatewayFailure(QStringLiteral("copying %1 from the device").arg(source), result, reason);
         return ExitSuccess;
@@ -46,9 +46,9 @@ int push(Cli& cli, const QStringList& arguments)
         QString target = arguments.at(2);
         if (target.endsWith(QLatin1Char('/')))
             target += QFileInfo(source).fileName();
+        ProgressLine line(cli);
         QString reason;
-        const int result = device.CopyFileToDevice(source, target, &Cli::progress, &cli, &reason);
-        cli.endProgress();
+        const int result = device.CopyFileToDevice(source, target, &ProgressLine::report, &line, &reason);
         if (result)
             return cli.gatewayFailure(QStringLiteral("copying %1 to the device").arg(source), result, reason);
         return ExitSuccess;
@@ -75,8 +75,8 @@ int install(Cli& cli, const QStringList& arguments)
         const int result = device.InstallPackage(arguments.at(1), quint16(chosen->volumeId), &reason);
         if (result)
             return cli.gatewayFailure(QStringLiteral("installing %1").arg(arguments.at(1)), result, reason);
-        std::fputs(qPrintable(reason + QLatin1Char('\n')), stdout);
-        return ExitSuccess;
+        return cli.writeOutput((reason + QLatin1Char('
+')).toUtf8());
     });
 }
 
@@ -117,7 +117,7 @@ QVector<CliCommand> fileCommands()
          3, 3, push},
         {QStringLiteral("install"), QStringLiteral("DEVICE PACKAGE"), QStringLiteral("Install a .zantro package"),
          QStringLiteral("Installs onto the --volume given, else onto the first volume by mount point, and\n"
-                        "prints the device's word on it."),
+                        "writes the device's word on it to the output (standard output, or the -o file)."),
          2, 2, install},
         {QStringLiteral("run"), QStringLiteral("DEVICE PATH"), QStringLiteral("Start a .mod file on the device"), QString(),
          2, 2, run},

@@ -7,6 +7,7 @@
 #include "PlatformScanFile.h"
 #include "PlatformScanReport.h"
 #include "Portlex.h"
+#include "ProgressLine.h"
 #include "ScanComparison.h"
 
 #include <QFileInfo>
@@ -18,10 +19,10 @@ int mifOfFile(Cli& cli, const QString& path)
     MifReader reader;
     if (!reader.readFile(path))
         return cli.fail(
-            ExitGatewayError, QStringLiteral("cannot read %1: %2").arg(path, reader.errorString()));
+            ExitGatewayOrFileError, QStringLiteral("cannot read %1: %2").arg(path, reader.errorString()));
     MifEntry entry;
     if (!reader.decodeModule(entry))
-        return cli.fail(ExitGatewayError, QStringLiteral("%1 holds no module information").arg(path));
+        return cli.fail(ExitGatewayOrFileError, QStringLiteral("%1 holds no module information").arg(path));
     return cli.emitReport(MifEntryReport::build(entry));
 }
 
@@ -42,7 +43,7 @@ int mifOfModule(Cli& cli, const QString& deviceName, const QString& module)
                 paths.append(known.path);
         }
         if (paths.isEmpty()) {
-            return cli.fail(ExitGatewayError,
+            return cli.fail(ExitGatewayOrFileError,
                 QStringLiteral("%1 has no module \"%2\" (\"delvix-cli modules %1\" lists them)")
                     .arg(deviceName, module));
         }
@@ -74,13 +75,15 @@ int scan(Cli& cli, const QStringList& arguments)
 {
     const QString& folder = arguments.at(0);
     if (!QFileInfo(folder).isDir())
-        return cli.fail(ExitGatewayError, QStringLiteral("%1 is not a folder").arg(folder));
+        return cli.fail(ExitGatewayOrFileError, QStringLiteral("%1 is not a folder").arg(folder));
     initializeLibrary();
     std::vector<MifEntry> entries;
-    Portlex::GetPlatformClassIds(folder, entries, Cli::progress, &cli);
-    cli.endProgress();
+    {
+        ProgressLine line(cli);
+        Portlex::GetPlatformClassIds(folder, entries, &ProgressLine::report, &line);
+    }
     if (entries.empty())
-        return cli.fail(ExitGatewayError, QStringLiteral("no module information file below %1").arg(folder));
+        return cli.fail(ExitGatewayOrFileError, QStringLiteral("no module information file below %1").arg(folder));
     return cli.emitReport(PlatformScanReport::build(PlatformScanReport::rows(entries)));
 }
 
@@ -90,9 +93,9 @@ int compare(Cli& cli, const QStringList& arguments)
     for (const QString& path : arguments) {
         const PlatformScanFile file = PlatformScanFile::read(path);
         if (file.status == PlatformScanFile::Unreadable)
-            return cli.fail(ExitGatewayError, file.errorString);
+            return cli.fail(ExitGatewayOrFileError, file.errorString);
         if (file.status == PlatformScanFile::WrongFormat)
-            return cli.fail(ExitGatewayError,
+            return cli.fail(ExitGatewayOrFileError,
                 QStringLiteral("%1 is not a platform scan: it has no class list").arg(path));
         const int scan = comparison.addScan(file.header);
         for (const PlatformScanFile::Entry& entry : file.entries)
@@ -103,7 +106,7 @@ int compare(Cli& cli, const QStringList& arguments)
         return status;
     for (int c = 0; c < comparison.classes().size(); ++c) {
         if (!comparison.isInEveryScan(c))
-            return ExitFinding;
+            return ExitCheckFailed;
     }
     return ExitSuccess;
 }

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <QString>
+
 // Result codes of the gateway. 0 is success everywhere. Codes below 1000 and any code a
 // device chooses (such as 3 for a missing registry or 0xDEADBEEF) pass through unchanged.
 namespace PortlexError {
@@ -34,5 +36,10 @@ enum Device : int
     IsDirectory = 1108,      // a file transfer names a directory
     TransferIncomplete = 1109, // a transfer ended with fewer or more bytes than announced
 };
+
+// What a gateway code means, in words for a message ("the device did not answer in time");
+// empty for a code a device chose, which has no name here. The window and the command line
+// both word failures with it.
+QString describe(int code);
 
 } // namespace PortlexError

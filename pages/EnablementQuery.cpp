@@ -16,13 +16,14 @@ EnablementQuery EnablementQuery::ask(_ZantDevice& device, bool withPrivileges)
 {
     EnablementQuery answer;
     QString mode, owner, signatureExpiry, serviceExpiry;
-    const EnablementStatus signature = device.GlobalTestSigStatus(mode, owner, signatureExpiry);
+    QString reason;
+    const EnablementStatus signature = device.GlobalTestSigStatus(mode, owner, signatureExpiry, &reason);
     const EnablementStatus service
-        = isFailure(signature) ? signature : device.TepStatus(mode, owner, serviceExpiry);
+        = isFailure(signature) ? signature : device.TepStatus(mode, owner, serviceExpiry, &reason);
     for (const EnablementStatus status : {signature, service}) {
         if (isFailure(status)) {
             answer.code = int(status);
-            answer.reason = device.statusText;
+            answer.reason = reason;
             return answer;
         }
     }

@@ -2,9 +2,10 @@
 
 #include "CITreeWidgetItem.h"
 #include "DeviceCache.h"
+#include "DisplayText.h"
 #include "FamilyGrouping.h"
 #include "LevelFiles.h"
-#include "LevelReport.h"
+#include "LevelCheck.h"
 #include "NameLibrary.h"
 
 #include <QFileInfo>
@@ -36,7 +37,7 @@ QTreeWidgetItem* classItem(const QStringList& cells)
     item->setText(ResultColumn, result);
     IdRecord found;
     found.available = true;
-    item->setForeground(ResultColumn, QBrush(result == LevelReport::resultText(found) ? Qt::green : Qt::red));
+    item->setForeground(ResultColumn, QBrush(result == LevelCheck::resultText(found) ? Qt::green : Qt::red));
     return item;
 }
 
@@ -154,9 +155,9 @@ std::shared_ptr<LevelViewWidget::LevelRead> LevelViewWidget::read(const QString&
     auto level = std::make_shared<LevelRead>();
     QList<IdRecord> entries;
     QString error;
-    level->readable = LevelReport::check(path, classes, &entries, &error);
+    level->readable = LevelCheck::check(path, classes, &entries, &error);
     if (level->readable)
-        level->families = FamilyGrouping::items(FamilyReport::group(entries, LevelReport::cells), classItem);
+        level->families = FamilyGrouping::items(FamilyReport::group(entries, LevelCheck::cells), classItem);
     return level;
 }
 

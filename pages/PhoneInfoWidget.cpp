@@ -1,6 +1,7 @@
 #include "PhoneInfoWidget.h"
 
 #include "DeviceCache.h"
+#include "DisplayText.h"
 #include "NameLibrary.h"
 #include "PhoneInfoReport.h"
 
@@ -35,7 +36,7 @@ void PhoneInfoWidget::setDeviceRecord(const DeviceCache* record)
     _screenWidth->setText(hardware("cxScreen"));
     _screenHeight->setText(hardware("cyScreen"));
 
-    const auto feature = [&data](const char* key) { return PhoneInfoReport::hasFeature(data, QLatin1String(key)); };
+    const auto feature = [&data](const char* key) { return DisplayText::hasFeature(data, QLatin1String(key)); };
     _flipPhone->setChecked(feature("FlipPhone"));
     _vibrate->setChecked(feature("Vibrate"));
     _locationSupport->setChecked(feature("LocationSupport"));
@@ -55,7 +56,7 @@ void PhoneInfoWidget::setDeviceRecord(const DeviceCache* record)
     _hwid->setText(hardware("HWID"));
     _deviceIDHash->setText(hardware("DeviceIDHash"));
 
-    const auto size = [&data](const char* key) { return PhoneInfoReport::sizeText(data, QLatin1String(key)); };
+    const auto size = [&data](const char* key) { return DisplayText::deviceSize(data, QLatin1String(key)); };
     _totalMemory->setText(size("HeapMemory"));
     _freeMemory->setText(size("HeapFree"));
     _fsSpace->setText(size("FSTotal"));

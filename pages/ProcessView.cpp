@@ -1,5 +1,6 @@
 #include "ProcessView.h"
 
+#include "DisplayText.h"
 #include "ProcessReport.h"
 #include "ProcessViewThread.h"
 
@@ -25,7 +26,7 @@ LiveTreePage::Poll ProcessView::mergeSnapshot()
     return mergeFrom(*m_processes, &ProcessInfo::threads, [](QTreeWidgetItem* row, const ThreadEntry& thread) {
         row->setText(ThreadNameColumn, thread.name);
         row->setText(IdColumn, QString::number(thread.id));
-        row->setText(StateColumn, ProcessReport::threadStateText(thread.state));
+        row->setText(StateColumn, DisplayText::threadState(thread.state));
         row->setText(PriorityColumn, QString::number(thread.priority));
     });
 }

@@ -24,6 +24,4 @@ public:
 
     static QStringList cells(const IdRecord& record);
     static Report build(const QVector<QStringList>& rows, const DeviceData& device);
-    // A class's name, family or sub-family as the pages show it when the databases have none.
-    static QString orUnknown(const QString& text);
 };

@@ -1,6 +1,7 @@
 #include "FamilyReport.h"
 
 #include "ClassReport.h"
+#include "DisplayText.h"
 #include "FamilyRule.h"
 
 #include <QHash>
@@ -8,6 +9,18 @@
 #include <algorithm>
 
 namespace {
+
+// The family, sub-family and class elements' fields, with the page's column titles.
+void declareFamilies(Report& report, const QString& subFamilyTitle, bool withResult)
+{
+    report.declare(QStringLiteral("family"), {{QStringLiteral("name"), ReportField::Text, QStringLiteral("Family")}});
+    report.declare(QStringLiteral("subfamily"), {{QStringLiteral("name"), ReportField::Text, subFamilyTitle}});
+    QVector<ReportField> classFields {{QStringLiteral("name"), ReportField::Text, QStringLiteral("Class Name")},
+                                      {QStringLiteral("classid"), ReportField::Id, QStringLiteral("Class ID")}};
+    if (withResult)
+        classFields.append({QStringLiteral("available"), ReportField::Boolean, QStringLiteral("Result")});
+    report.declare(QStringLiteral("class"), classFields);
+}
 
 void addFamilies(ReportNode& parent, const FamilyReport::Families& families, const QStringList& classAttributes)
 {
@@ -33,9 +46,9 @@ QVector<IdRecord> FamilyReport::availableClasses(const IdRecordMap& classes)
         if (!known.available)
             continue;
         IdRecord record = known;
-        record.name = ClassReport::orUnknown(record.name);
-        record.family = ClassReport::orUnknown(record.family);
-        record.subFamily = ClassReport::orUnknown(record.subFamily);
+        record.name = DisplayText::orUnknown(record.name);
+        record.family = DisplayText::orUnknown(record.family);
+        record.subFamily = DisplayText::orUnknown(record.subFamily);
         shown.append(record);
     }
     return shown;
@@ -84,6 +97,7 @@ Report FamilyReport::familyTree(const Families& families, const DeviceData& devi
     report.root()
         .set(QStringLiteral("device"), device.targetId)
         .set(QStringLiteral("manufacturer"), device.hardwareValue(QStringLiteral("Manufacturer"), QString()));
+    declareFamilies(report, QStringLiteral("Sub-Family"), false);
     addFamilies(report.root(), families, {QStringLiteral("name"), QStringLiteral("classid")});
     return report;
 }
@@ -91,6 +105,7 @@ Report FamilyReport::familyTree(const Families& families, const DeviceData& devi
 Report FamilyReport::levelReport(const Families& families)
 {
     Report report(QStringLiteral("levelreport"), QStringLiteral("device"), QStringLiteral("class"));
+    declareFamilies(report, QStringLiteral("Subfamily"), true);
     addFamilies(report.root(), families, {QStringLiteral("name"), QStringLiteral("classid"), QStringLiteral("available")});
     return report;
 }

@@ -18,6 +18,15 @@ void addEntry(ReportNode& folder, const QString& type, const QString& name, cons
 Report FolderReport::build(const _DirectoryInfo& level)
 {
     Report report(QStringLiteral("zant-folder"), QStringLiteral("folder"), QStringLiteral("entry"));
+    report.declare(QStringLiteral("folder"),
+                   {{QStringLiteral("name"), ReportField::Text, QString()},
+                    {QStringLiteral("path"), ReportField::Text, QString()}});
+    report.declare(QStringLiteral("entry"),
+                   {{QStringLiteral("type"), ReportField::Text, QStringLiteral("Type")},
+                    {QStringLiteral("name"), ReportField::Text, QStringLiteral("Name")},
+                    {QStringLiteral("path"), ReportField::Text, QStringLiteral("Path")},
+                    {QStringLiteral("size"), ReportField::Integer, QStringLiteral("Size")},
+                    {QStringLiteral("attributes"), ReportField::Text, QStringLiteral("File Attributes")}});
     ReportNode& folder = report.root();
     folder.set(QStringLiteral("name"), level.Name()).set(QStringLiteral("path"), level.Path());
     folder.children.reserve(level.directories.size() + level.files.size());

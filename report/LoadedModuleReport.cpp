@@ -3,6 +3,13 @@
 Report LoadedModuleReport::build(const QVector<LoadedModuleInfo>& processes)
 {
     Report report(QStringLiteral("zant-loaded-modules"), QStringLiteral("loaded-modules"), QStringLiteral("module"));
+    report.declare(QStringLiteral("process"),
+                   {{QStringLiteral("name"), ReportField::Text, QStringLiteral("Process Name")},
+                    {QStringLiteral("id"), ReportField::Integer, QStringLiteral("Process ID")}});
+    report.declare(QStringLiteral("module"),
+                   {{QStringLiteral("name"), ReportField::Text, QStringLiteral("Module Name")},
+                    {QStringLiteral("size"), ReportField::Integer, QStringLiteral("Size")},
+                    {QStringLiteral("location"), ReportField::Text, QStringLiteral("Location")}});
     report.root().children.reserve(processes.size());
     for (const LoadedModuleInfo& process : processes) {
         ReportNode& row = report.root()

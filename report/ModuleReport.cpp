@@ -9,6 +9,13 @@ QStringList ModuleReport::cells(const ModuleInfo& module)
 Report ModuleReport::build(const QVector<QStringList>& rows)
 {
     Report report(QStringLiteral("zant-modules"), QStringLiteral("modules"), QStringLiteral("module"));
+    report.declare(QStringLiteral("module"),
+                   {{QStringLiteral("name"), ReportField::Text, QStringLiteral("Module Name")},
+                    {QStringLiteral("version"), ReportField::Text, QStringLiteral("Component Services Version")},
+                    {QStringLiteral("type"), ReportField::Flags, QStringLiteral("Module Type")},
+                    {QStringLiteral("signature"), ReportField::Text, QStringLiteral("Signature")},
+                    {QStringLiteral("path"), ReportField::Text, QStringLiteral("Path")},
+                    {QStringLiteral("copyright"), ReportField::Text, QStringLiteral("Copyright")}});
     ReportNode& modules = report.root();
     modules.children.reserve(rows.size());
     for (const QStringList& cell : rows) {

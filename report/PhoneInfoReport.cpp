@@ -1,6 +1,6 @@
 #include "PhoneInfoReport.h"
 
-#include "FormatSize.h"
+#include "DisplayText.h"
 
 namespace {
 
@@ -16,27 +16,53 @@ void addFormats(ReportNode& formats, const QString& kind, const QMap<QString, QS
 
 } // namespace
 
-QString PhoneInfoReport::sizeText(const DeviceData& device, const QString& key)
-{
-    bool ok = false;
-    const qint64 value = device.hardwareValue(key, QString()).toLongLong(&ok, 10);
-    return formatSize(ok && value > 0 ? quint64(value) : 0);
-}
-
-bool PhoneInfoReport::hasFeature(const DeviceData& device, const QString& key)
-{
-    return device.hardwareValue(key, QString()) == QLatin1String("Yes");
-}
-
 Report PhoneInfoReport::build(const DeviceData& device)
 {
     const auto hardware = [&device](const char* key) { return device.hardwareValue(QLatin1String(key), QString()); };
     const auto feature = [&device](const char* key) {
-        return hasFeature(device, QLatin1String(key)) ? QStringLiteral("Yes") : QStringLiteral("No");
+        return DisplayText::hasFeature(device, QLatin1String(key)) ? QStringLiteral("Yes") : QStringLiteral("No");
     };
-    const auto size = [&device](const char* key) { return sizeText(device, QLatin1String(key)); };
+    const auto size = [&device](const char* key) { return DisplayText::deviceSize(device, QLatin1String(key)); };
+    const auto bytes = [&device](const char* key) { return QJsonValue(DisplayText::deviceBytes(device, QLatin1String(key))); };
 
     Report report(QStringLiteral("phone-info"), QStringLiteral("phone-info"), QStringLiteral("format"));
+    report.declare(QStringLiteral("hardware"),
+                   {{QStringLiteral("manufacturer"), ReportField::Text, QString()},
+                    {QStringLiteral("model"), ReportField::Text, QString()},
+                    {QStringLiteral("phone-name"), ReportField::Text, QString()},
+                    {QStringLiteral("firmware"), ReportField::Text, QString()},
+                    {QStringLiteral("platform-id"), ReportField::Text, QString()},
+                    {QStringLiteral("mobile-id"), ReportField::Text, QString()},
+                    {QStringLiteral("chip-id"), ReportField::Text, QString()},
+                    {QStringLiteral("imei"), ReportField::Text, QString()},
+                    {QStringLiteral("hwid"), ReportField::Text, QString()},
+                    {QStringLiteral("qxe-version"), ReportField::Text, QString()},
+                    {QStringLiteral("color-depth"), ReportField::Integer, QString()},
+                    {QStringLiteral("screen-width"), ReportField::Integer, QString()},
+                    {QStringLiteral("screen-height"), ReportField::Integer, QString()},
+                    {QStringLiteral("flip-phone"), ReportField::Boolean, QString()},
+                    {QStringLiteral("vibrate"), ReportField::Boolean, QString()},
+                    {QStringLiteral("location-support"), ReportField::Boolean, QString()},
+                    {QStringLiteral("pen-support"), ReportField::Boolean, QString()}});
+    report.declare(QStringLiteral("device"),
+                   {{QStringLiteral("target-id"), ReportField::Text, QString()},
+                    {QStringLiteral("mdn"), ReportField::Text, QString()},
+                    {QStringLiteral("ruimid"), ReportField::Text, QString()},
+                    {QStringLiteral("device-id-hash"), ReportField::Text, QString()},
+                    {QStringLiteral("memory"), ReportField::Text, QString()},
+                    {QStringLiteral("free-memory"), ReportField::Text, QString()},
+                    {QStringLiteral("file-system-size"), ReportField::Text, QString()},
+                    {QStringLiteral("file-system-available-size"), ReportField::Text, QString()}});
+    report.declare(QStringLiteral("zant"),
+                   {{QStringLiteral("version"), ReportField::Text, QString()},
+                    {QStringLiteral("build-number"), ReportField::Text, QString()},
+                    {QStringLiteral("component-services-build"), ReportField::Text, QString()},
+                    {QStringLiteral("dynamic-build-id"), ReportField::Text, QString()},
+                    {QStringLiteral("static-build-id"), ReportField::Text, QString()}});
+    report.declare(QStringLiteral("format"),
+                   {{QStringLiteral("kind"), ReportField::Text, QStringLiteral("Kind")},
+                    {QStringLiteral("format"), ReportField::Text, QStringLiteral("Format")},
+                    {QStringLiteral("supported"), ReportField::Text, QStringLiteral("Supported")}});
     ReportNode& root = report.root();
     root.add(QStringLiteral("hardware"))
         .set(QStringLiteral("manufacturer"), hardware("Manufacturer"))
@@ -61,10 +87,10 @@ Report PhoneInfoReport::build(const DeviceData& device)
         .set(QStringLiteral("mdn"), hardware("DeviceMDN"))
         .set(QStringLiteral("ruimid"), hardware("RUIMID"))
         .set(QStringLiteral("device-id-hash"), hardware("DeviceIDHash"))
-        .set(QStringLiteral("memory"), size("HeapMemory"))
-        .set(QStringLiteral("free-memory"), size("HeapFree"))
-        .set(QStringLiteral("file-system-size"), size("FSTotal"))
-        .set(QStringLiteral("file-system-available-size"), size("FSAvail"));
+        .set(QStringLiteral("memory"), size("HeapMemory"), bytes("HeapMemory"))
+        .set(QStringLiteral("free-memory"), size("HeapFree"), bytes("HeapFree"))
+        .set(QStringLiteral("file-system-size"), size("FSTotal"), bytes("FSTotal"))
+        .set(QStringLiteral("file-system-available-size"), size("FSAvail"), bytes("FSAvail"));
     root.add(QStringLiteral("zant"))
         .set(QStringLiteral("version"), device.zantVersion)
         .set(QStringLiteral("build-number"), device.zantBuildNumber)

@@ -10,11 +10,5 @@
 class PhoneInfoReport
 {
 public:
-    // A size the device gives in bytes, formatted; anything but a plain non-negative
-    // decimal number counts as 0 (a negative count would otherwise show as exabytes).
-    static QString sizeText(const DeviceData& device, const QString& key);
-    // A feature the device has: only the exact text "Yes" counts.
-    static bool hasFeature(const DeviceData& device, const QString& key);
-
     static Report build(const DeviceData& device);
 };

@@ -1,24 +1,18 @@
 #include "ProcessReport.h"
 
-QString ProcessReport::threadStateText(quint32 state)
-{
-    switch (state) {
-    case 0:
-        return QStringLiteral("Included");
-    case 1:
-        return QStringLiteral("Default");
-    case 2:
-        return QStringLiteral("Excluded");
-    case 3:
-        return QStringLiteral("Hard Excluded");
-    default:
-        return QStringLiteral("Unknown:") + QString::number(state);
-    }
-}
+#include "DisplayText.h"
 
 Report ProcessReport::build(const QVector<ProcessInfo>& processes)
 {
     Report report(QStringLiteral("zant-processes"), QStringLiteral("processes"), QStringLiteral("thread"));
+    report.declare(QStringLiteral("process"),
+                   {{QStringLiteral("name"), ReportField::Text, QStringLiteral("Process Name")},
+                    {QStringLiteral("id"), ReportField::Integer, QStringLiteral("Process ID")}});
+    report.declare(QStringLiteral("thread"),
+                   {{QStringLiteral("name"), ReportField::Text, QStringLiteral("Thread Name")},
+                    {QStringLiteral("id"), ReportField::Integer, QStringLiteral("ID")},
+                    {QStringLiteral("state"), ReportField::Text, QStringLiteral("State")},
+                    {QStringLiteral("priority"), ReportField::Integer, QStringLiteral("Priority")}});
     report.root().children.reserve(processes.size());
     for (const ProcessInfo& process : processes) {
         ReportNode& row = report.root()
@@ -29,7 +23,7 @@ Report ProcessReport::build(const QVector<ProcessInfo>& processes)
             row.add(QStringLiteral("thread"))
                 .set(QStringLiteral("name"), thread.name)
                 .set(QStringLiteral("id"), QString::number(thread.id))
-                .set(QStringLiteral("state"), threadStateText(thread.state))
+                .set(QStringLiteral("state"), DisplayText::threadState(thread.state))
                 .set(QStringLiteral("priority"), QString::number(thread.priority));
         }
     }

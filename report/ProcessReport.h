@@ -11,7 +11,5 @@
 class ProcessReport
 {
 public:
-    // "Included", "Default", "Excluded", "Hard Excluded", else "Unknown:" and the value.
-    static QString threadStateText(quint32 state);
     static Report build(const QVector<ProcessInfo>& processes);
 };

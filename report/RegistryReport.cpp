@@ -1,26 +1,20 @@
 #include "RegistryReport.h"
 
-QString RegistryReport::flagsText(const RegistryInfo& entry)
-{
-    QString flags;
-    if (entry.active)
-        flags = QStringLiteral("Active");
-    if (entry.restricted) {
-        if (!flags.isEmpty())
-            flags += QStringLiteral(" | ");
-        flags += QStringLiteral("Restricted");
-    }
-    return flags;
-}
+#include "DisplayText.h"
 
 QStringList RegistryReport::cells(const RegistryInfo& entry)
 {
-    return {QString::number(entry.baseClassId), QString::number(entry.handlerClassId), flagsText(entry), entry.mimeType};
+    return {QString::number(entry.baseClassId), QString::number(entry.handlerClassId), DisplayText::registryFlags(entry), entry.mimeType};
 }
 
 Report RegistryReport::build(const QVector<QStringList>& rows)
 {
     Report report(QStringLiteral("registrylist"), QStringLiteral("entries"), QStringLiteral("entry"));
+    report.declare(QStringLiteral("entry"),
+                   {{QStringLiteral("class-type"), ReportField::Integer, QStringLiteral("Class Type")},
+                    {QStringLiteral("class-handler"), ReportField::Integer, QStringLiteral("Class Handler")},
+                    {QStringLiteral("flags"), ReportField::Flags, QStringLiteral("Flags")},
+                    {QStringLiteral("mime-type"), ReportField::Text, QStringLiteral("Mime Type")}});
     ReportNode& entries = report.root();
     entries.children.reserve(rows.size());
     for (const QStringList& cell : rows) {

@@ -19,8 +19,6 @@ public:
         MimeTypeColumn
     };
 
-    // "Active", "Restricted", both joined by " | ", or nothing.
-    static QString flagsText(const RegistryInfo& entry);
     static QStringList cells(const RegistryInfo& entry);
     static Report build(const QVector<QStringList>& rows);
 };

@@ -1,15 +1,25 @@
 #pragma once
 
-#include <QPair>
+#include <QJsonValue>
 #include <QString>
 #include <QVector>
 
-// One element of a report: its name, its attributes in the order they are written, and its
-// child elements in document order.
+// One attribute of a report element: its name, the text the page shows, and, when the text
+// is no plain rendering of it, the value machine output carries (a size in bytes behind
+// "32.00 MB").
+struct ReportAttribute
+{
+    QString name;
+    QString text;
+    QJsonValue value = QJsonValue::Undefined;
+};
+
+// One element of a report: its name, its attributes in the order the export writes them,
+// and its child elements in document order.
 struct ReportNode
 {
     QString element;
-    QVector<QPair<QString, QString>> attributes;
+    QVector<ReportAttribute> attributes;
     QVector<ReportNode> children;
 
     ReportNode() = default;
@@ -19,9 +29,9 @@ struct ReportNode
     }
 
     // Appends an attribute; returns the node, so that a row's attributes chain.
-    ReportNode& set(const QString& name, const QString& value)
+    ReportNode& set(const QString& name, const QString& text, const QJsonValue& value = QJsonValue::Undefined)
     {
-        attributes.append(qMakePair(name, value));
+        attributes.append({name, text, value});
         return *this;
     }
     // Appends a child element and returns it. References to earlier children do not survive it.

@@ -74,9 +74,7 @@ void ModuleInfoDialog::openDeviceModule(const QString& deviceId, const ModuleInf
         this,
         [device, path] {
             MifAnswer answer;
-            answer.code = device->GetModuleMif(path, answer.entry);
-            if (answer.code != 0)
-                answer.reason = device->statusText;
+            answer.code = device->GetModuleMif(path, answer.entry, &answer.reason);
             return answer;
         },
         [this](const MifAnswer& answer) {

@@ -1,9 +1,10 @@
-// Runs "delvix-cli modules" and "delvix-cli classes" against a generated image (10,000
-// modules and 20,000 classes unless told otherwise) served by a real simulator, each three
-// times, and prints the median wall time and peak memory of the tool's process; then, in
-// the same run, the time the device window's Modules and Class IDs pages take to "Ready".
+// Runs "delvix-cli modules", "classes", "snapshot" (no hashes) and "diff" of two snapshots
+// against a generated image (10,000 modules, 20,000 classes and 50,000 files unless told
+// otherwise) served by a real simulator, each three times, and prints the median wall time
+// and peak memory of the tool's process (and the snapshot's size); then, in the same run,
+// the time the device window's Modules and Class IDs pages take to "Ready".
 //
-// bench_cli [--modules N] [--classes N] [--runs N]
+// bench_cli [--modules N] [--classes N] [--files N] [--runs N]
 
 #include "ClassListView.h"
 #include "DeviceWindow.h"
@@ -101,15 +102,16 @@ template<typename T> T median(QVector<T> values)
     return values.at(values.size() / 2);
 }
 
-void benchCommand(const QString& command, int runs, const QString& outputPath)
+// Targets: wall time in ms and peak memory in MB.
+void benchCommand(const QStringList& arguments, int runs, const QString& outputPath, int targetMs = 1000, int targetMb = 100)
 {
     const QString tool = QCoreApplication::applicationDirPath() + QStringLiteral("/delvix-cli");
     QVector<qint64> walls;
     QVector<long> peaks;
-    out() << QStringLiteral("delvix-cli %1 %2:\n").arg(command, DeviceId);
+    out() << QStringLiteral("delvix-cli %1:\n").arg(arguments.join(QLatin1Char(' ')));
     out().flush();
     for (int i = 0; i < runs; ++i) {
-        const Run run = runTool(tool, {command, DeviceId}, outputPath);
+        const Run run = runTool(tool, arguments, outputPath);
         out() << QStringLiteral("  run %1: exit %2, %3 ms, peak %4 MB, %5 KB written\n")
                      .arg(i + 1)
                      .arg(run.status)
@@ -122,9 +124,11 @@ void benchCommand(const QString& command, int runs, const QString& outputPath)
         walls.append(run.wallMs);
         peaks.append(run.peakKb);
     }
-    out() << QStringLiteral("  median: %1 ms (target < 1000 ms), peak %2 MB (target < 100 MB)\n")
+    out() << QStringLiteral("  median: %1 ms (target < %3 ms), peak %2 MB (target < %4 MB)\n")
                  .arg(median(walls))
-                 .arg(median(peaks) / 1024.0, 0, 'f', 1);
+                 .arg(median(peaks) / 1024.0, 0, 'f', 1)
+                 .arg(targetMs)
+                 .arg(targetMb);
     out().flush();
 }
 
@@ -166,6 +170,8 @@ int main(int argc, char** argv)
         QStringLiteral("10000")});
     options.addOption({QStringLiteral("classes"), QStringLiteral("classes of the image"), QStringLiteral("N"),
         QStringLiteral("20000")});
+    options.addOption({QStringLiteral("files"), QStringLiteral("files of the image"), QStringLiteral("N"),
+        QStringLiteral("50000")});
     options.addOption({QStringLiteral("runs"), QStringLiteral("runs of each command"), QStringLiteral("N"),
         QStringLiteral("3")});
     options.process(app);
@@ -174,14 +180,20 @@ int main(int argc, char** argv)
     const int runs = std::max(1, options.value(QStringLiteral("runs")).toInt());
 
     QProcess server;
-    const QSharedPointer<_ZantDevice> device = serveGeneratedDevice(server, work, modules, classes);
+    const int files = options.value(QStringLiteral("files")).toInt();
+    const QSharedPointer<_ZantDevice> device = serveGeneratedDevice(server, work, modules, classes, 0, PageBenchDevice::DeviceId, files);
     if (!device)
         return 1;
-    out() << QStringLiteral("image: %1 modules, %2 classes\n").arg(modules).arg(device->cache()->classes.size());
+    out() << QStringLiteral("image: %1 modules, %2 classes, %3 files\n").arg(modules).arg(device->cache()->classes.size()).arg(files);
 
     const QString outputPath = work.filePath(QStringLiteral("output"));
-    benchCommand(QStringLiteral("modules"), runs, outputPath);
-    benchCommand(QStringLiteral("classes"), runs, outputPath);
+    benchCommand({QStringLiteral("modules"), DeviceId}, runs, outputPath);
+    benchCommand({QStringLiteral("classes"), DeviceId}, runs, outputPath);
+    const QString first = work.filePath(QStringLiteral("first.json")), second = work.filePath(QStringLiteral("second.json"));
+    benchCommand({QStringLiteral("snapshot"), DeviceId, QStringLiteral("-o"), first}, runs, outputPath, 3000, 200);
+    out() << QStringLiteral("  snapshot size: %1 MB\n").arg(QFile(first).size() / 1048576.0, 0, 'f', 1);
+    benchCommand({QStringLiteral("snapshot"), DeviceId, QStringLiteral("-o"), second}, 1, outputPath, 3000, 200);
+    benchCommand({QStringLiteral("diff"), first, second}, runs, outputPath, 1000, 200);
 
     {
         DeviceWindow window;

@@ -35,11 +35,11 @@ QString simulatorPath()
     return QCoreApplication::applicationDirPath() + QStringLiteral("/zantro-sim");
 }
 
-bool generateImage(const QString& image, int modules, int classes, int settings)
+bool generateImage(const QString& image, int modules, int classes, int settings, int files)
 {
     QStringList arguments = {QStringLiteral("generate"), image, QStringLiteral("--modules"), QString::number(modules),
                              QStringLiteral("--classes"), QString::number(classes), QStringLiteral("--files"),
-                             QStringLiteral("0"), QStringLiteral("--processes"), QStringLiteral("0")};
+                             QString::number(files), QStringLiteral("--processes"), QStringLiteral("0")};
     if (settings > 0)
         arguments << QStringLiteral("--settings") << QString::number(settings);
     return QProcess::execute(simulatorPath(), arguments) == 0;
@@ -61,10 +61,10 @@ QSharedPointer<_ZantDevice> connectDevice(const QString& id)
 }
 
 QSharedPointer<_ZantDevice> serveGeneratedDevice(QProcess& server, const QTemporaryDir& work, int modules, int classes,
-                                                 int settings, const QString& id)
+                                                 int settings, const QString& id, int files)
 {
     const QString image = work.filePath(QStringLiteral("image-") + id);
-    if (!work.isValid() || !generateImage(image, modules, classes, settings)) {
+    if (!work.isValid() || !generateImage(image, modules, classes, settings, files)) {
         std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulatorPath()));
         return {};
     }

@@ -1,6 +1,5 @@
 #include "CliRun.h"
 #include "PortlexErrors.h"
-#include "ProcessReport.h"
 #include "SimulatorProcess.h"
 #include "TestSupport.h"
 #include "XmlEscape.h"
@@ -92,30 +91,35 @@ private slots:
         QCOMPARE(treeEntries(m_local->path()), QStringList {"source.bin"});
     }
 
-    // ls, processes, loaded-modules and settings write what the gateway answers.
+    // ls, loaded-modules and settings write what the gateway answers; names that need CSV
+    // quoting or look like a spreadsheet formula, and every thread state, are written out.
     void stateIsTheGatewaysAnswer()
     {
-        QSharedPointer<_DirectoryInfo> level;
-        QVector<ProcessInfo> processes;
+        for (const char* name : {"a,b.txt", "q\"x.txt", "=1+2.txt", "@sum.txt"})
+            QVERIFY(writeFile(local(name), "bytes") && runCli({"push", "kestrel", local(name), "/user/odd/"}).exitCode == 0);
+        QStringList listed = csv({"ls", "kestrel", "/user/odd"}), raw = csv({"--csv-raw", "ls", "kestrel", "/user/odd"});
+        std::sort(listed.begin() + 1, listed.end());
+        std::sort(raw.begin() + 1, raw.end());
+        QCOMPARE(listed, (QStringList {"Type,Name,Path,Size,File Attributes", "file,\"a,b.txt\",\"/user/odd/a,b.txt\",5,rw-",
+                                       "file,\"q\"\"x.txt\",\"/user/odd/q\"\"x.txt\",5,rw-", "file,'=1+2.txt,/user/odd/=1+2.txt,5,rw-",
+                                       "file,'@sum.txt,/user/odd/@sum.txt,5,rw-"}));
+        QCOMPARE(raw.mid(3), (QStringList {"file,=1+2.txt,/user/odd/=1+2.txt,5,rw-", "file,@sum.txt,/user/odd/@sum.txt,5,rw-"}));
+
+        // The handset's kernel and messaging threads hold every state.
+        QStringList threads;
+        for (const QJsonValue& process : QJsonDocument::fromJson(runCli({"--format", "json", "processes", "kestrel"}).out)["process"].toArray())
+            for (const QJsonValue& t : process["thread"].toArray())
+                if (process["name"] == QJsonValue("Kernel") || process["name"] == QJsonValue("Messaging"))
+                    threads << QStringLiteral("%1 %2 %3").arg(t["name"].toString(), t["state"].toString()).arg(t["priority"].toInt());
+        QCOMPARE(threads.mid(0, 2) + threads.mid(threads.size() - 3),
+                 (QStringList {"idle Default 0", "scheduler Included 250", "inbox Default 140", "mms Excluded 120", "push Hard Excluded 130"}));
+
         QVector<LoadedModuleInfo> loaded;
-        QVERIFY(runCli({"push", "kestrel", m_package.filePath("demo.zantro"), "/user/"}).exitCode == 0);
-        QVERIFY(m_device->GetFileSystemLevel("/user", level, nullptr, nullptr) == 0 && m_device->GetProcesses(processes) == 0
-                && m_device->GetLoadedModules(loaded) == 0 && !level->directories.isEmpty() && !level->files.isEmpty());
-        QStringList entries {"type,name,path,size,attributes"}, threads {"process.name,process.id,name,id,state,priority"},
-            modules {"process.name,process.id,name,size,location"};
-        for (const auto& folder : std::as_const(level->directories))
-            entries << QStringList {"folder", folder->Name(), folder->Path(), "", ""}.join(',');
-        for (const auto& file : std::as_const(level->files))
-            entries << QStringList {"file", file->Name(), file->Path(), QString::number(file->size), file->Attributes()}.join(',');
-        for (const ProcessInfo& process : std::as_const(processes))
-            for (const ThreadEntry& t : process.threads)
-                threads << QStringList {process.name, QString::number(process.id), t.name, QString::number(t.id),
-                                        ProcessReport::threadStateText(t.state), QString::number(t.priority)}.join(',');
+        QVERIFY(m_device->GetLoadedModules(loaded) == 0);
+        QStringList modules {"Process Name,Process ID,Module Name,Size,Location"};
         for (const LoadedModuleInfo& process : std::as_const(loaded))
             for (const LoadedModuleEntry& m : process.modules)
                 modules << QStringList {process.name, QString::number(process.id), m.name, QString::number(m.size), m.location}.join(',');
-        QCOMPARE(csv({"ls", "kestrel", "/user"}), entries);
-        QCOMPARE(csv({"processes", "kestrel"}), threads);
         QCOMPARE(csv({"loaded-modules", "kestrel"}), modules);
         // Every node with its values, each before its children.
         QStringList nodes, written, pending {"/"};
