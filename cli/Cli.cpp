@@ -1,5 +1,6 @@
 #include "Cli.h"
 
+#include "DelvixVersion.h"
 #include "DeviceReportCommands.h"
 #include "DeviceStateCommands.h"
 #include "FileCommands.h"
@@ -10,6 +11,7 @@
 #include <QCoreApplication>
 #include <QSaveFile>
 
+#include <cerrno>
 #include <cstdio>
 #include <unistd.h>
 
@@ -58,6 +60,7 @@ const char* const OptionsHelp =
     "  --fail-on-difference    compare: exit 1 when a class is in one scan only\n"
     "  --volume ID|MOUNT       install: the volume to install to (default: the first)\n"
     "  -h, --help              this help, or a command's help\n"
+    "  --version               the version\n"
     "\n"
     "DEVICE is a device id or a unique part of its display name (see \"devices\").\n"
     "\n"
@@ -104,6 +107,9 @@ int Cli::run()
             optionsEnded = true;
         } else if (name == QLatin1String("-h") || name == QLatin1String("--help")) {
             helpAsked = true;
+        } else if (name == QLatin1String("--version")) {
+            writeOut(stdout, QStringLiteral("%1 %2\n").arg(QLatin1String(ToolName), QLatin1String(DELVIX_VERSION)));
+            return ExitSuccess;
         } else if (name == QLatin1String("--fail-on-difference")) {
             m_failOnDifference = true;
         } else if (name == QLatin1String("--format")) {
@@ -231,8 +237,12 @@ int Cli::emitReport(const Report& report)
 {
     const QByteArray bytes = report.write(m_format);
     if (m_output.isEmpty()) {
-        if (std::fwrite(bytes.constData(), 1, size_t(bytes.size()), stdout) != size_t(bytes.size()) || std::fflush(stdout) != 0)
+        if (std::fwrite(bytes.constData(), 1, size_t(bytes.size()), stdout) != size_t(bytes.size()) || std::fflush(stdout) != 0) {
+            // A reader that has seen enough (head, a pager quit early) is a normal end.
+            if (errno == EPIPE)
+                return ExitSuccess;
             return fail(ExitGatewayError, QStringLiteral("could not write the output"));
+        }
         return ExitSuccess;
     }
     QSaveFile file(m_output);
