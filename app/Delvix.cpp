@@ -1,7 +1,9 @@
 #include "Delvix.h"
 
 #include "AboutDialog.h"
+#include "DelvixVersion.h"
 #include "DeviceDirectory.h"
+#include "DeviceListWindow.h"
 #include "DeviceWindow.h"
 #include "PlatformTools.h"
 #include "Portlex.h"
@@ -17,7 +19,7 @@
 
 namespace {
 
-const char* const Version = "0.5.1.0";
+const char* const Version = DELVIX_VERSION;
 
 // How often the device list is probed while nobody asks for it.
 const int DeviceProbeIntervalMs = 1000;
@@ -41,7 +43,7 @@ QString notice()
 
 } // namespace
 
-Delvix::Delvix(QWidget* parent)
+Delvix::Delvix(Shell shell, QWidget* parent)
     : QDialog(parent)
 {
     // A pool thread keeps its connections to the devices while it lives: let it end with its connect.
@@ -58,11 +60,15 @@ Delvix::Delvix(QWidget* parent)
     m_directory = new DeviceDirectory(DeviceProbeIntervalMs, this);
     connect(m_directory, &DeviceDirectory::changed, this, [this] { showDevices(); });
     createTrayIcon();
-    m_trayIcon->show();
     hide();
 
     _actionAbout->setData(AboutEntry);
     connect(_actionAbout, &QAction::triggered, this, &Delvix::onTriggered);
+    if (shell == Shell::Window) {
+        createWindow();
+        return;
+    }
+    m_trayIcon->show();
 
     QSettings settings;
     const int seen = settings.value("seen", 0).toInt();
@@ -77,6 +83,7 @@ Delvix::Delvix(QWidget* parent)
 
 Delvix::~Delvix()
 {
+    delete m_window;
     m_trayIcon->hide();
     m_connects.waitForDone();
     // Connects that ended while this waited never report back: give back their busy cursors here.
@@ -100,6 +107,20 @@ void Delvix::createTrayIcon()
     m_trayIcon = new QSystemTrayIcon(this);
     m_trayIcon->setContextMenu(m_trayMenu);
     m_trayIcon->setIcon(QIcon(":/Resources/TrayIcon.png"));
+}
+
+void Delvix::createWindow()
+{
+    m_window = new DeviceListWindow(m_directory);
+    m_window->_menuFile->addAction(_actionExit);
+    m_window->_menuTools->addActions({_actionProcess_Platform, _actionCompare_Platforms});
+    m_window->_menuHelp->addAction(_actionAbout);
+    connect(m_window, &DeviceListWindow::deviceChosen, this, &Delvix::connectToDevice);
+    connect(m_window, &DeviceListWindow::closeRequested, this, [this] {
+        if (!m_exiting)
+            onActionExit();
+    });
+    m_window->show();
 }
 
 void Delvix::onAboutToShow()
@@ -201,6 +222,10 @@ void Delvix::connectFinished(const QString& targetId, const QString& failure)
     const int windows = m_connecting.take(targetId);
     if (m_exiting)
         return;
+    if (!failure.isEmpty() && m_window) {
+        m_window->showConnectFailed(failure);
+        return;
+    }
     if (!failure.isEmpty()) {
         m_trayIcon->showMessage(tr("Connect Failed"), failure, QSystemTrayIcon::Information, 2500);
         return;

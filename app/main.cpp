@@ -1,8 +1,9 @@
 #include "Delvix.h"
+#include "DelvixVersion.h"
 #include "Portlex.h"
 
 #include <QApplication>
-#include <QMessageBox>
+#include <QCommandLineParser>
 #include <QSystemTrayIcon>
 
 #include <memory>
@@ -12,19 +13,27 @@ int main(int argc, char* argv[])
     Q_INIT_RESOURCE(delvix);
     QApplication application(argc, argv);
     QApplication::setApplicationName("Delvix");
+    QApplication::setApplicationVersion(DELVIX_VERSION);
     QApplication::setOrganizationName("Norvale");
     QApplication::setOrganizationDomain("norvale.example");
+    // The desktop matches the windows to the installed entry (and its icon) by this name.
+    QGuiApplication::setDesktopFileName("org.norvale.Delvix");
 
-    if (!QSystemTrayIcon::isSystemTrayAvailable()) {
-        QMessageBox::critical(nullptr, QObject::tr("Systray"),
-                              QObject::tr("I couldn't detect any system tray on this system."), QMessageBox::Ok);
-        return 1;
-    }
-    // Closing device windows must not end the program; only Exit does.
+    QCommandLineParser parser;
+    parser.setApplicationDescription(QObject::tr("Explore Zantro handsets and simulators."));
+    parser.addHelpOption();
+    parser.addVersionOption();
+    const QCommandLineOption window("window", QObject::tr("Open the main window instead of the system tray icon."));
+    parser.addOption(window);
+    parser.process(application);
+
+    // Closing device windows must not end the program; only Exit (or closing the main window) does.
     QApplication::setQuitOnLastWindowClosed(false);
     Portlex::Initialize();
 
-    auto delvix = std::make_unique<Delvix>();
+    // Most desktops show no tray out of the box: the main window stands in for it there.
+    const bool trayless = parser.isSet(window) || !QSystemTrayIcon::isSystemTrayAvailable();
+    auto delvix = std::make_unique<Delvix>(trayless ? Delvix::Shell::Window : Delvix::Shell::Tray);
     QApplication::exec();
     delvix.reset();
     Portlex::Destroy();

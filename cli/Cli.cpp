@@ -1,5 +1,6 @@
 #include "Cli.h"
 
+#include "DelvixVersion.h"
 #include "DeviceReportCommands.h"
 #include "DeviceStateCommands.h"
 #include "FileCommands.h"
@@ -12,6 +13,7 @@
 
 #include <QCoreApplication>
 
+#include <cerrno>
 #include <cstdio>
 #include <unistd.h>
 
@@ -36,6 +38,7 @@ const char* const OptionsHelp =
     "  --hash-limit BYTES      snapshot: hash the content of files up to this size\n"
     "  --volume ID|MOUNT       install: the volume to install to (default: the first)\n"
     "  -h, --help              this help, or a command's help\n"
+    "  --version               the version\n"
     "\n"
     "DEVICE is a device id or a unique part of its display name (see \"devices\").\n"
     "-o and pull replace only a regular file: a link or a device node there is refused.\n"
@@ -95,6 +98,9 @@ int Cli::run()
             optionsEnded = true;
         } else if (name == QLatin1String("-h") || name == QLatin1String("--help")) {
             helpAsked = true;
+        } else if (name == QLatin1String("--version")) {
+            writeOut(stdout, QStringLiteral("%1 %2\n").arg(QLatin1String(ToolName), QLatin1String(DELVIX_VERSION)));
+            return ExitSuccess;
         } else if (name == QLatin1String("--fail-on-difference")) {
             m_failOnDifference = true;
         } else if (name == QLatin1String("--csv-raw")) {
@@ -251,8 +257,12 @@ int Cli::emitReport(Report report)
 int Cli::writeOutput(const QByteArray& bytes)
 {
     if (m_output.isEmpty()) {
-        if (std::fwrite(bytes.constData(), 1, size_t(bytes.size()), stdout) != size_t(bytes.size()) || std::fflush(stdout) != 0)
+        if (std::fwrite(bytes.constData(), 1, size_t(bytes.size()), stdout) != size_t(bytes.size()) || std::fflush(stdout) != 0) {
+            // A reader that has seen enough (head, a pager quit early) is a normal end.
+            if (errno == EPIPE)
+                return ExitSuccess;
             return fail(ExitGatewayOrFileError, QStringLiteral("could not write the output"));
+        }
         return ExitSuccess;
     }
     SafeOutputFile file(m_output);

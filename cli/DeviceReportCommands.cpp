@@ -168,8 +168,8 @@ QVector<CliCommand> deviceReportCommands()
         {QStringLiteral("level"), QStringLiteral("DEVICE LEVEL"), QStringLiteral("Check the device against a level"),
          QStringLiteral("The document the Level page exports: each class the level requires under its family\n"
                         "and sub-family (grouped as \"family-tree\" groups them), \"Found\" or \"Not Found\".\n"
-                        "LEVEL is a level of the Levels folder beside the program, named as the Level page\n"
-                        "lists it, or the path of a level file.\n"
+                        "LEVEL is a level of the installed Levels folder or of ~/.local/share/delvix/Levels,\n"
+                        "named as the Level page lists it, or the path of a level file.\n"
                         "--format junit writes JUnit XML for CI: a test suite per family, a test case per\n"
                         "class, a failure naming each class not found.\n"
                         "Exit status 1 when a class is not found (after writing the document), 2 for an\n"

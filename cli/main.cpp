@@ -3,8 +3,12 @@
 
 #include <QCoreApplication>
 
+#include <csignal>
+
 int main(int argc, char* argv[])
 {
+    // A closed output pipe shows as EPIPE on the write, which ends the command quietly.
+    std::signal(SIGPIPE, SIG_IGN);
     QCoreApplication application(argc, argv);
     QCoreApplication::setApplicationName(QStringLiteral("delvix-cli"));
     Portlex::Initialize();

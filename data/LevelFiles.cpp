@@ -1,11 +1,17 @@
 #include "LevelFiles.h"
 
-#include <QCoreApplication>
+#include "DataFolders.h"
+
 #include <QDir>
 
 void listLevelFiles(QStringList& list)
 {
-    listLevelFiles(QCoreApplication::applicationDirPath() + QDir::separator() + QStringLiteral("Levels"), list);
+    list.clear();
+    for (const QString& folder : DataFolders::levelFolders()) {
+        QStringList files;
+        listLevelFiles(folder, files);
+        list += files;
+    }
 }
 
 void listLevelFiles(const QString& levelsDirectory, QStringList& list)

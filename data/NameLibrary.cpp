@@ -1,8 +1,7 @@
 #include "NameLibrary.h"
 
+#include "DataFolders.h"
 #include "NameDatabases.h"
-
-#include <QCoreApplication>
 
 namespace {
 
@@ -16,12 +15,12 @@ NameDatabases& processDatabases()
 
 void initializeLibrary()
 {
-    processDatabases().initialize(QCoreApplication::applicationDirPath());
+    processDatabases().initialize(DataFolders::nameDatabaseFolder());
 }
 
 void loadNameDatabases()
 {
-    processDatabases().load(QCoreApplication::applicationDirPath());
+    processDatabases().load(DataFolders::nameDatabaseFolder());
 }
 
 void lookupClass(const QString& idText, QString& name, QString& family, QString& subFamily)

@@ -88,11 +88,11 @@ void LevelViewWidget::offerLevelFiles(const DeviceCache* record, QStringList fil
     m_record = record;
     if (!record)
         return;
-    // A folder listing has no useful order of its own; the files share their folder, so the
-    // paths sort as the names do.
+    // A folder listing has no useful order of its own: by name, whichever level folder holds the file.
     std::sort(files.begin(), files.end(), [](const QString& a, const QString& b) {
-        const int order = a.compare(b, Qt::CaseInsensitive);
-        return order != 0 ? order < 0 : a < b;
+        const QString nameA = QFileInfo(a).fileName(), nameB = QFileInfo(b).fileName();
+        const int order = nameA.compare(nameB, Qt::CaseInsensitive);
+        return order != 0 ? order < 0 : (nameA != nameB ? nameA < nameB : a < b);
     });
     for (const QString& file : std::as_const(files)) {
         const QFileInfo info(file);

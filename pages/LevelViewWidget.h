@@ -21,8 +21,8 @@ public:
     explicit LevelViewWidget(QWidget* parent = nullptr);
 
     // Offers the level files for record's device (the record stays the device's), sorted by
-    // name; null offers nothing. The files are those of the "Levels" folder beside the
-    // program, or of levelsDirectory.
+    // name; null offers nothing. The files are those of the level folders (see
+    // DataFolders), or of levelsDirectory.
     void setDeviceRecord(const DeviceCache* record);
     void setDeviceRecord(const DeviceCache* record, const QString& levelsDirectory);
 

@@ -1,9 +1,9 @@
 #include "ZantFSTreeWidget.h"
 
+#include "DataFolders.h"
 #include "DeviceFileSystemView.h"
 
 #include <QApplication>
-#include <QCoreApplication>
 #include <QDrag>
 #include <QDragEnterEvent>
 #include <QFileInfo>
@@ -14,10 +14,8 @@
 
 ZantFSTreeWidget::ZantFSTreeWidget(QWidget* parent)
     : QTreeWidget(parent)
-    , m_anchorPath(QCoreApplication::applicationDirPath() + QStringLiteral("/Drag-And-Drop-Anchor.mss"))
+    , m_anchorPath(DataFolders::locate(QStringLiteral("Drag-And-Drop-Anchor.mss")))
 {
-    if (!QFileInfo::exists(m_anchorPath))
-        m_anchorPath.clear();
     setAcceptDrops(true);
 }
 

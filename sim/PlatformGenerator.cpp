@@ -1,5 +1,6 @@
 #include "PlatformGenerator.h"
 
+#include "DataFolders.h"
 #include "IdFormat.h"
 #include "MifEntry.h"
 #include "MifWriter.h"
@@ -7,7 +8,6 @@
 #include "SampleBuilder.h"
 
 #include <QCommandLineParser>
-#include <QCoreApplication>
 #include <QDir>
 #include <QFile>
 #include <QTextStream>
@@ -196,7 +196,7 @@ int PlatformGenerator::run(const QStringList& arguments, QTextStream& out, QText
         return 2;
     }
     const QString outputDir = parser.positionalArguments().first();
-    const QString namesDir = parser.isSet(names) ? parser.value(names) : QCoreApplication::applicationDirPath();
+    const QString namesDir = parser.isSet(names) ? parser.value(names) : DataFolders::nameDatabaseFolder();
 
     PlatformGenerator generator;
     if (!generator.generate(outputDir, count, classDatabaseIds(namesDir))) {

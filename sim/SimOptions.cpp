@@ -55,8 +55,10 @@ QString SimOptions::helpText()
         "                         e.g. GetRegistry=3, GetChildSettings:/appinfo=0xDEADBEEF,\n"
         "                         GetFileSystemLevel:/user=0xDEADBEEF\n"
         "  --names DIR            folder of ClassDB.xml, InterfaceDB.xml, PriviledgeDB.xml used\n"
-        "                         to name classes and privileges (default: the program's folder)\n"
+        "                         to name classes and privileges (default: the installed\n"
+        "                         reference data)\n"
         "  --help                 show this text\n"
+        "  --version              show the version\n"
         "\n"
         "Operations for --fail: ")
         + SimRequestHandler::operationNames().join(QStringLiteral(", ")) + QLatin1Char('\n');
@@ -94,11 +96,16 @@ bool SimOptions::parseServe(const QStringList& arguments)
     const QCommandLineOption failOption(QStringLiteral("fail"), QString(), QStringLiteral("RULE"));
     const QCommandLineOption lifetime(QStringLiteral("run-lifetime"), QString(), QStringLiteral("MS"));
     const QCommandLineOption help(QStringList{QStringLiteral("help"), QStringLiteral("h")});
-    parser.addOptions({image, id, socketDirOption, names, resetOption, refuse, latency, failOption, lifetime, help});
+    const QCommandLineOption version(QStringLiteral("version"));
+    parser.addOptions({image, id, socketDirOption, names, resetOption, refuse, latency, failOption, lifetime, help, version});
     if (!parser.parse(arguments))
         return fail(parser.errorText());
     if (parser.isSet(help)) {
         command = Command::Help;
+        return true;
+    }
+    if (parser.isSet(version)) {
+        command = Command::Version;
         return true;
     }
     if (!parser.positionalArguments().isEmpty())

@@ -18,6 +18,7 @@ public:
         MakeSample,
         Pack,
         Help,
+        Version,
     };
 
     // arguments includes the program name first. False, with errorString(), on a mistake.

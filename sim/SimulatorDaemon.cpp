@@ -1,12 +1,12 @@
 #include "SimulatorDaemon.h"
 
+#include "DataFolders.h"
 #include "FrameServer.h"
 #include "ImageCopy.h"
 #include "SignalPipe.h"
 #include "SimOptions.h"
 #include "SimRequestHandler.h"
 
-#include <QCoreApplication>
 #include <QDir>
 #include <QFileInfo>
 
@@ -46,7 +46,7 @@ bool SimulatorDaemon::start(const SimOptions& options)
         imageDir = m_copy->path();
     }
 
-    const QString namesDir = options.namesDir.isEmpty() ? QCoreApplication::applicationDirPath() : options.namesDir;
+    const QString namesDir = options.namesDir.isEmpty() ? DataFolders::nameDatabaseFolder() : options.namesDir;
     // Errors name the image the user gave, not its temporary copy.
     if (!m_state.load(imageDir, namesDir))
         return fail(m_copy ? m_state.errorString().replace(m_copy->path(), options.imageDir) : m_state.errorString());

@@ -1,3 +1,4 @@
+#include "DelvixVersion.h"
 #include "ImageGenerator.h"
 #include "PackageWriter.h"
 #include "PlatformGenerator.h"
@@ -27,6 +28,9 @@ int main(int argc, char* argv[])
     switch (options.command) {
     case SimOptions::Command::Help:
         out << SimOptions::helpText();
+        return 0;
+    case SimOptions::Command::Version:
+        out << "zantro-sim " DELVIX_VERSION "\n";
         return 0;
     case SimOptions::Command::Generate: {
         ImageGenerator generator;

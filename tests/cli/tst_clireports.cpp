@@ -261,6 +261,22 @@ private slots:
         QVERIFY(run.out.isEmpty());
     }
 
+    // A reader that went away (head, a pager quit early) ends the command quietly, with success.
+    void closedOutputIsANormalEnd()
+    {
+        QProcess process;
+        // The output is a pipe whose reader is gone before the tool writes.
+        process.setChildProcessModifier([] {
+            int ends[2];
+            if (::pipe(ends) == 0 && ::close(ends[0]) == 0)
+                ::dup2(ends[1], STDOUT_FILENO);
+        });
+        process.start(QCoreApplication::applicationDirPath() + "/delvix-cli", {"classes", "kestrel-k7"});
+        QVERIFY(process.waitForFinished(60000) && process.exitStatus() == QProcess::NormalExit);
+        QCOMPARE(process.exitCode(), 0);
+        QCOMPARE(process.readAllStandardError(), QByteArray());
+    }
+
     // -o replaces the file through a save file: a second link keeps the old content.
     void outputReplacesTheFile()
     {

@@ -1,3 +1,4 @@
+#include "DataFolders.h"
 #include "IdFormat.h"
 #include "LevelDefinition.h"
 #include "LevelFiles.h"
@@ -318,6 +319,25 @@ private slots:
                 QCOMPARE(name, r.name);
             }
         }
+    }
+
+    // The program's own folder wins over the data folders; the user's levels come after the
+    // shipped ones, and only its level files.
+    void dataFoldersInOrder()
+    {
+        QTemporaryDir home;
+        qputenv("XDG_DATA_HOME", QFile::encodeName(home.path()));
+        const QString own = home.filePath("delvix"), program = QCoreApplication::applicationDirPath();
+        for (const char* file : {"/ClassDB.xml", "/Only-here.mss", "/Levels/Mine.xml", "/Levels/notes.txt"})
+            QVERIFY(TestSupport::writeFile(own + file, TwoClasses));
+
+        QCOMPARE(DataFolders::searchPath().mid(0, 3), QStringList({program, QDir::cleanPath(program + "/../share/delvix"), own}));
+        QCOMPARE(DataFolders::locate("ClassDB.xml"), program + "/ClassDB.xml");
+        QCOMPARE(DataFolders::locate("Only-here.mss"), own + "/Only-here.mss");
+        QVERIFY(DataFolders::locate("Nowhere.mss").isEmpty());
+        QStringList files;
+        listLevelFiles(files);
+        QCOMPARE(files.mid(2), QStringList({own + "/Levels/Mine.xml"}));
     }
 };
 
