@@ -555,7 +555,7 @@ void DeviceWindow::rebuildPages(const QSet<int>& indexes, const QSharedPointer<c
         if (m_currentPage == _moduleListView)
             connect(_moduleListView, &ModuleListView::doubleClick, this, &DeviceWindow::onModuleInfoExamine);
         if (m_currentPage == _deviceFSView)
-            connect(_deviceFSView, &DeviceFileSystemView::doubleClick, this, &DeviceWindow::onFileSystemDoubleClick);
+            connect(_deviceFSView, &DeviceFileSystemView::localCopyReady, this, &DeviceWindow::onLocalCopyReady);
         attachCurrentPage();
     }
 }

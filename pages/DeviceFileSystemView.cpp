@@ -133,10 +133,12 @@ void DeviceFileSystemView::selectVolume(const QString& mountPoint)
     loadVolume(mountPoint, false);
 }
 
-void DeviceFileSystemView::refresh()
+bool DeviceFileSystemView::refresh()
 {
-    if (m_device)
-        loadVolume(m_volume.mountPoint, true);
+    if (!m_device)
+        return false;
+    loadVolume(m_volume.mountPoint, true);
+    return true;
 }
 
 void DeviceFileSystemView::loadVolume(const QString& mountPoint, bool keepView)

@@ -63,8 +63,8 @@ public slots:
     QString xmlReport() override;
 
     // Reads the shown volume again; the tree keeps its expanded folders that still exist
-    // and its selection.
-    void refresh();
+    // and its selection. False, doing nothing, before the page has its device.
+    bool refresh() override;
     // Copies the device file into this run's private folder; localCopyReady names the copy.
     void openOnComputer(const QString& devicePath);
 

@@ -35,9 +35,7 @@ QTreeWidgetItem* classItem(const QStringList& cells)
     item->setText(IdColumn, cells.value(FamilyReport::IdColumn));
     const QString result = cells.value(FamilyReport::ResultColumn);
     item->setText(ResultColumn, result);
-    IdRecord found;
-    found.available = true;
-    item->setForeground(ResultColumn, QBrush(result == LevelCheck::resultText(found) ? Qt::green : Qt::red));
+    item->setForeground(ResultColumn, QBrush(result == DisplayText::levelResult(true) ? Qt::green : Qt::red));
     return item;
 }
 
