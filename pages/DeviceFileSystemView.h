@@ -80,8 +80,6 @@ signals:
     void singleClick(QString fileEntry);
     // A file opened on this computer has arrived at localPath, to be shown there.
     void localCopyReady(QString localPath);
-    // An install, copy, delete or run changed what the device holds.
-    void deviceContentChanged();
     // A job has ended (all done, failed or cancelled).
     void transferFinished();
 

@@ -136,7 +136,7 @@ private slots:
         for (const QString device : {"kestrel-k7", "aurora-sim"}) {
             for (const auto& [command, schema] : commands) {
                 // The simulator's processes come and go between two runs; the handset's stay.
-                if (device == "kestrel-k7" || !command.contains("process") && !command.startsWith("loaded"))
+                if (device == "kestrel-k7" || (!command.contains("process") && !command.startsWith("loaded")))
                     QTest::addRow("%s %s", qPrintable(command), qPrintable(device)) << QStringList {command, device} << schema;
             }
             QTest::addRow("level %s", qPrintable(device)) << QStringList {"level", device, "Level-1"} << "levelreport";

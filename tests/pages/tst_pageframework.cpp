@@ -388,9 +388,9 @@ private slots:
         network->child(0)->setSelected(true);
         QSignalSpy timed(&page, &GatewayComponentWidget::timedStatusChanged);
         QVERIFY(page.searchInTree("midi"));
-        QCOMPARE(marked(page.tree), QString("Multimedia+ Audio+ MidiPlayer*+ MidiSynth*+ MidiTools*+"));
+        QCOMPARE(marked(page.tree), QString("Multimedia+ Audio+ MidiPlayer* MidiSynth* MidiTools*"));
         QVERIFY(page.searchInTree("0X0000"));
-        QCOMPARE(marked(page.tree), QString("Network+ Sockets0x000000ab*+"));
+        QCOMPARE(marked(page.tree), QString("Network+ Sockets0x000000ab*"));
         QVERIFY(timed.isEmpty());
         QVERIFY(page.searchInTree("Sockets0x"));
         QCOMPARE(marked(page.tree), QString());
