@@ -279,6 +279,10 @@ void DeviceWindow::attachCurrentPage()
     connect(m_currentPage, &GatewayComponentWidget::statusChanged, this, &DeviceWindow::SetStatus);
     connect(m_currentPage, &GatewayComponentWidget::timedStatusChanged, this, &DeviceWindow::SetTimedStatus);
     connect(m_currentPage, &GatewayComponentWidget::stateChanged, this, &DeviceWindow::onComponentStateChange);
+    if (m_currentPage == _moduleListView)
+        connect(_moduleListView, &ModuleListView::doubleClick, this, &DeviceWindow::onModuleInfoExamine);
+    if (m_currentPage == _deviceFSView)
+        connect(_deviceFSView, &DeviceFileSystemView::localCopyReady, this, &DeviceWindow::onLocalCopyReady);
     m_shownSlots.insert(_stackedWidget->currentIndex());
     m_currentPage->raisePriority();
     m_currentPage->startComponent(m_deviceId);
@@ -313,10 +317,6 @@ void DeviceWindow::onToolbarActionTriggered(QAction* triggerAction)
     if (m_staleSlots.remove(index) && deviceConnected())
         requery({index});
     m_currentPage = pageAt(index);
-    if (m_currentPage == _moduleListView)
-        connect(_moduleListView, &ModuleListView::doubleClick, this, &DeviceWindow::onModuleInfoExamine);
-    if (m_currentPage == _deviceFSView)
-        connect(_deviceFSView, &DeviceFileSystemView::localCopyReady, this, &DeviceWindow::onLocalCopyReady);
     attachCurrentPage();
     if (!m_currentPage) {
         onComponentStateChange(GatewayComponentWidget::Starting);
@@ -552,10 +552,6 @@ void DeviceWindow::rebuildPages(const QSet<int>& indexes, const QSharedPointer<c
     }
     if (reattach) {
         m_currentPage = pageAt(shown);
-        if (m_currentPage == _moduleListView)
-            connect(_moduleListView, &ModuleListView::doubleClick, this, &DeviceWindow::onModuleInfoExamine);
-        if (m_currentPage == _deviceFSView)
-            connect(_deviceFSView, &DeviceFileSystemView::localCopyReady, this, &DeviceWindow::onLocalCopyReady);
         attachCurrentPage();
     }
 }

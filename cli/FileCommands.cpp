@@ -75,8 +75,7 @@ int install(Cli& cli, const QStringList& arguments)
         const int result = device.InstallPackage(arguments.at(1), quint16(chosen->volumeId), &reason);
         if (result)
             return cli.gatewayFailure(QStringLiteral("installing %1").arg(arguments.at(1)), result, reason);
-        return cli.writeOutput((reason + QLatin1Char('
-')).toUtf8());
+        return cli.writeOutput((reason + QLatin1Char('\n')).toUtf8());
     });
 }
 

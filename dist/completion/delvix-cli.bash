@@ -12,16 +12,16 @@ _delvix_cli()
     local cur=${COMP_WORDS[COMP_CWORD]} prev=${COMP_WORDS[COMP_CWORD - 1]}
     # The commands and options of --help, in its order (tests/dist/check-install compares).
     local commands="devices modules info classes family-tree registry level settings processes
-        loaded-modules ls pull push install run rm mif scan compare"
-    local options="--format --output -o --fail-on-difference --volume --help -h --version"
+        loaded-modules ls pull push install run rm mif scan compare snapshot diff"
+    local options="--format --output -o --csv-raw --fail-on-difference --hash-limit --volume --help -h --version"
     COMPREPLY=()
 
     case $prev in
         --format)
-            COMPREPLY=($(compgen -W "xml json csv" -- "$cur"))
+            COMPREPLY=($(compgen -W "xml json csv junit" -- "$cur"))
             return
             ;;
-        -o | --output | --volume)
+        -o | --output | --volume | --hash-limit)
             return
             ;;
     esac
@@ -34,7 +34,7 @@ _delvix_cli()
     local command="" argument=0 i
     for ((i = 1; i < COMP_CWORD; i++)); do
         case ${COMP_WORDS[i]} in
-            --format | -o | --output | --volume) ((i++)) ;;
+            --format | -o | --output | --volume | --hash-limit) ((i++)) ;;
             -*) ;;
             *)
                 if [[ -z $command ]]; then
@@ -50,6 +50,8 @@ _delvix_cli()
         "") COMPREPLY=($(compgen -W "$commands help" -- "$cur")) ;;
         help) ((argument == 0)) && COMPREPLY=($(compgen -W "$commands" -- "$cur")) ;;
         devices | mif | scan | compare) ;;
+        # Each side is a snapshot file (the shell's completion) or a running device.
+        diff) ((argument < 2)) && COMPREPLY=($(compgen -W "$(_delvix_cli_devices "${COMP_WORDS[0]}")" -- "$cur")) ;;
         *) ((argument == 0)) && COMPREPLY=($(compgen -W "$(_delvix_cli_devices "${COMP_WORDS[0]}")" -- "$cur")) ;;
     esac
     return 0

@@ -428,14 +428,14 @@ private slots:
         DeviceWindow* window = openWindow("returning");
         window->action_Modules->trigger();
         QTRY_COMPARE_WITH_TIMEOUT(window->_moduleListView->status(), QString("Ready"), 20000);
-        const int modules = window->_moduleListView->_moduleTable->rowCount();
+        const int modules = window->_moduleListView->_moduleTable->model()->rowCount();
         QPointer<ModuleListView> page = window->_moduleListView;
         simulator.kill();
         QTRY_COMPARE_WITH_TIMEOUT(statusText(window), QString("Device disconnected"), 15000);
         QCOMPARE(indicator(window)->_modeStatus->text(), QString("Disconnected"));
         QVERIFY(!window->_stackedWidget->isEnabled() && !indicator(window)->isEnabled()
                 && !window->action_Security_Settings->isEnabled() && !window->actionExport_to_XML->isEnabled());
-        QCOMPARE(page->_moduleTable->rowCount(), modules);
+        QCOMPARE(page->_moduleTable->model()->rowCount(), modules);
         for (const QLabel* label : window->_phoneInfoWidget->findChildren<QLabel*>())
             QVERIFY2(!label->text().contains("Error") && !label->text().contains("not found"), qPrintable(label->text()));
 
@@ -443,7 +443,7 @@ private slots:
         QTRY_VERIFY_WITH_TIMEOUT(window->deviceConnected(), 15000);
         QVERIFY(!page && window->_stackedWidget->isEnabled());
         QTRY_COMPARE_WITH_TIMEOUT(window->_moduleListView->status(), QString("Ready"), 20000);
-        QCOMPARE(window->_moduleListView->_moduleTable->rowCount(), modules);
+        QCOMPARE(window->_moduleListView->_moduleTable->model()->rowCount(), modules);
         QCOMPARE(window->_phoneInfoWidget->_model->text(), QString("Aurora Reference Simulator"));
         QTRY_VERIFY(indicator(window)->isEnabled());
 

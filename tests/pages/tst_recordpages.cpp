@@ -273,7 +273,7 @@ private slots:
     // Ticked by hand: after every tick the tree holds exactly the classes its status counts,
     // its families in order; the counts climb to the true one, then "Ready". Destroying a
     // page in the middle of its fill ends its worker.
-    void fillsInTimeSlices()
+    void familyTreeFillsInTimeSlices()
     {
         QList<IdRecord> records;
         const QStringList families = {"beta", "Alpha", "ALPHA"};
