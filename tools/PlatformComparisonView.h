@@ -1,11 +1,10 @@
 #pragma once
 
-#include "PlatformScanFile.h"
+#include "PlatformComparisonModel.h"
 #include "ScanComparison.h"
 #include "ui_PlatformComparisonView.h"
 
 #include <QFrame>
-#include <QIcon>
 
 // Platform scans side by side: one row per class id found in any of them, one column per
 // scan with a check where the scan has the class. A summary line counts the classes in every
@@ -15,36 +14,21 @@ class PlatformComparisonView : public QFrame, public Ui::PlatformComparisonViewC
     Q_OBJECT
 
 public:
-    // The columns before the first scan's.
-    static constexpr int FixedColumns = 4;
-
     explicit PlatformComparisonView(QWidget* parent = nullptr);
 
     // Adds the scan file at path as a new column. False when it cannot be read; a file without
     // a class list is also reported in a "File Format Error" box (its column stays).
     bool loadScan(const QString& path);
-    // Marks the class present in the scan shown in column; a class not shown yet gets a row.
-    void addScanEntry(int column, const QString& name, const QString& value, const QString& family,
-        const QString& subfamily);
     // The "platform-comparison" document of the scans loaded; empty before the first.
     QString exportText() const;
 
-    const ScanComparison& comparison() const { return m_comparison; }
+    const ScanComparison& comparison() const { return m_model->comparison(); }
+    const PlatformComparisonModel* model() const { return m_model; }
 
 public slots:
     // Hides the rows of classes that every scan has, or shows every row again.
     void showDifferencesOnly(bool on);
 
 private:
-    int addScanColumn(const QString& header);
-    // Marks each entry's class present in the scan of column, the new ones in rows added at once.
-    void addScanEntries(int column, const QVector<PlatformScanFile::Entry>& entries);
-    // Rows move when the table sorts: the row of each class is looked up afresh once per load.
-    void indexRows();
-    void refreshSummary();
-
-    QIcon m_checkIcon;
-    ScanComparison m_comparison;
-    QVector<int> m_rowOfClass;
-    bool m_rowsIndexed = false;
+    PlatformComparisonModel* m_model;
 };

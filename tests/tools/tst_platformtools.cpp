@@ -28,21 +28,25 @@ QByteArray scanFile(const QString& version, const QString& container, const QStr
     return (xml + QStringLiteral("</%1></ZTOINFO>").arg(container)).toUtf8();
 }
 
-// The table's rows (visible ones, or all), cells joined by "|", a check shown as "x"; then the headers.
-QStringList tableLines(const QTableWidget* table, bool all = true)
+// The rows shown, cells joined by "|", a check shown as "x" (centred), "?" for a mark not centred;
+// then the headers.
+QStringList tableLines(const QTableView* table)
 {
+    const QAbstractItemModel* model = table->model();
     QStringList lines, headers;
-    for (int row = 0; row < table->rowCount(); ++row) {
+    for (int row = 0; row < model->rowCount(); ++row) {
         QStringList cells;
-        for (int column = 0; column < table->columnCount(); ++column) {
-            const QTableWidgetItem* item = table->item(row, column);
-            cells << (!item ? QString() : item->icon().isNull() ? item->text() : QStringLiteral("x"));
+        for (int column = 0; column < model->columnCount(); ++column) {
+            const QModelIndex cell = model->index(row, column);
+            const bool centred = cell.data(Qt::TextAlignmentRole).toInt() == Qt::AlignCenter;
+            cells << (cell.data(Qt::DecorationRole).value<QIcon>().isNull() ? cell.data().toString()
+                          : centred                                       ? QStringLiteral("x")
+                                                                          : QStringLiteral("?"));
         }
-        if (all || !table->isRowHidden(row))
-            lines << cells.join('|');
+        lines << cells.join('|');
     }
-    for (int column = 0; column < table->columnCount(); ++column)
-        headers << table->model()->headerData(column, Qt::Horizontal).toString();
+    for (int column = 0; column < model->columnCount(); ++column)
+        headers << model->headerData(column, Qt::Horizontal).toString();
     return lines << headers.join('|');
 }
 
@@ -245,8 +249,8 @@ private slots:
                 lines);
     }
 
-    // "Differences only" hides the classes every scan has, also as a further scan loads;
-    // "Save to File..." writes every class with its presence in each scan.
+    // "Differences only" hides the classes every scan has, also as a further scan loads; header
+    // clicks sort; "Save to File..." writes every class with its presence in each scan.
     void differencesAndExport()
     {
         QTemporaryDir folder;
@@ -258,12 +262,18 @@ private slots:
         PlatformComparisonView* view = dialog->_platformView;
         view->_differencesOnly->setChecked(true);
         QVERIFY(dialog->loadFile(folder.filePath("a.xml")));
-        QCOMPARE(tableLines(view->_comparisonTable, false).size(), 1);
+        QCOMPARE(tableLines(view->_comparisonTable).size(), 1);
         QVERIFY(dialog->loadFile(folder.filePath("b.xml")));
-        QCOMPARE(tableLines(view->_comparisonTable, false).mid(0, 2),
+        QCOMPARE(tableLines(view->_comparisonTable).mid(0, 2),
             (QStringList {"Alpha|0x7E000001|F|S|x|", "Beta|0x7E000002|F|S||x"}));
         view->_differencesOnly->setChecked(false);
-        QCOMPARE(tableLines(view->_comparisonTable, false).size(), 4);
+        QCOMPARE(tableLines(view->_comparisonTable).size(), 4);
+        // By a scan's column its classes come first either way, the rest keeping their order.
+        view->_comparisonTable->sortByColumn(5, Qt::DescendingOrder);
+        QCOMPARE(tableLines(view->_comparisonTable).mid(0, 3),
+            (QStringList {"Beta|0x7E000002|F|S||x", "Heap|0x01011001|F|S|x|x", "Alpha|0x7E000001|F|S|x|"}));
+        view->_comparisonTable->sortByColumn(0, Qt::DescendingOrder);
+        QCOMPARE(tableLines(view->_comparisonTable).first(), "Heap|0x01011001|F|S|x|x");
 
         saveXmlReportDialogs().askFileName
             = [&](QWidget*, const QString& caption, const QString&, const QString&) {
