@@ -2,7 +2,6 @@
 
 #include "SortKey.h"
 
-#include <algorithm>
 
 RecordTableModel::RecordTableModel(const QStringList& headers, QObject* parent)
     : QAbstractTableModel(parent)
@@ -86,10 +85,7 @@ void RecordTableModel::sort(int column, Qt::SortOrder order)
     emit layoutAboutToBeChanged({}, QAbstractItemModel::VerticalSortHint);
     const QVector<int> before = m_order;
     // Stable in both directions: equal cells keep the order they were shown in.
-    if (order == Qt::AscendingOrder)
-        std::stable_sort(m_order.begin(), m_order.end(), [&key](int a, int b) { return key.at(a) < key.at(b); });
-    else
-        std::stable_sort(m_order.begin(), m_order.end(), [&key](int a, int b) { return key.at(b) < key.at(a); });
+    sortByKeys(m_order, key, order);
 
     QVector<int> rowOf(m_order.size());
     for (int row = 0; row < m_order.size(); ++row)

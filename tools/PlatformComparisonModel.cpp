@@ -126,13 +126,7 @@ void PlatformComparisonModel::sort(int column, Qt::SortOrder order)
         std::stable_partition(m_sorted.begin(), m_sorted.end(),
             [this, scan](int index) { return m_comparison.isPresent(index, scan); });
     } else {
-        const QVector<QString>& key = keys(column);
-        if (order == Qt::AscendingOrder)
-            std::stable_sort(
-                m_sorted.begin(), m_sorted.end(), [&key](int a, int b) { return key.at(a) < key.at(b); });
-        else
-            std::stable_sort(
-                m_sorted.begin(), m_sorted.end(), [&key](int a, int b) { return key.at(b) < key.at(a); });
+        sortByKeys(m_sorted, keys(column), order);
     }
     filterRows();
 
