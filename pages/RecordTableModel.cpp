@@ -2,7 +2,6 @@
 
 #include "SortKey.h"
 
-
 RecordTableModel::RecordTableModel(const QStringList& headers, QObject* parent)
     : QAbstractTableModel(parent)
     , m_headers(headers)
