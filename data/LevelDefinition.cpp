@@ -22,10 +22,11 @@ bool LevelDefinition::load(QIODevice* device)
 {
     XmlReadPolicy policy(XmlReadPolicy::DatabaseFileBytes);
     QByteArray bytes;
-    if (!policy.readChecked(device, bytes)) {
+    if (!policy.readBytes(device, bytes)) {
         m_error = policy.errorString();
         return false;
     }
+    const QString source = XmlReadPolicy::sourceName(device);
     // Streamed: a DOM of a file at the policy's size limit would cost gigabytes.
     QList<IdRecord> read;
     QXmlStreamReader xml(bytes);
@@ -33,6 +34,10 @@ bool LevelDefinition::load(QIODevice* device)
     int depth = 0;
     while (!xml.atEnd()) {
         const QXmlStreamReader::TokenType token = xml.readNext();
+        if (!policy.checkToken(xml, source)) {
+            m_error = policy.errorString();
+            return false;
+        }
         if (token == QXmlStreamReader::EndElement)
             --depth;
         if (token != QXmlStreamReader::StartElement || ++depth != 2 || xml.name() != u"Id")
@@ -44,9 +49,8 @@ bool LevelDefinition::load(QIODevice* device)
             read.append(record);
     }
     if (xml.hasError()) {
-        const auto* file = qobject_cast<const QFileDevice*>(device);
         m_error = QStringLiteral("%1 line %2: %3")
-                      .arg(file ? file->fileName() : QStringLiteral("XML input"))
+                      .arg(source)
                       .arg(xml.lineNumber())
                       .arg(xml.errorString());
         return false;

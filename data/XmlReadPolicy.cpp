@@ -33,8 +33,7 @@ bool XmlReadPolicy::readFile(const QString& path, QDomDocument& document)
 
 bool XmlReadPolicy::read(QIODevice* device, QDomDocument& document)
 {
-    const auto* file = qobject_cast<const QFileDevice*>(device);
-    const QString source = file ? file->fileName() : QStringLiteral("XML input");
+    const QString source = sourceName(device);
     QByteArray xml;
     return readLimited(device, source, xml) && parse(xml, source, document);
 }
@@ -73,21 +72,27 @@ bool XmlReadPolicy::parse(const QByteArray& xml, const QString& source, QDomDocu
     return true;
 }
 
-bool XmlReadPolicy::readCheckedFile(const QString& path, QByteArray& xml)
+bool XmlReadPolicy::readFileBytes(const QString& path, QByteArray& xml)
 {
     m_error.clear();
+    m_depth = 0;
     QFile file(path);
     if (!file.open(QIODevice::ReadOnly))
         return fail(QStringLiteral("cannot open %1: %2").arg(path, file.errorString()));
-    return readLimited(&file, path, xml) && check(xml, path);
+    return readLimited(&file, path, xml);
 }
 
-bool XmlReadPolicy::readChecked(QIODevice* device, QByteArray& xml)
+bool XmlReadPolicy::readBytes(QIODevice* device, QByteArray& xml)
 {
     m_error.clear();
+    m_depth = 0;
+    return readLimited(device, sourceName(device), xml);
+}
+
+QString XmlReadPolicy::sourceName(const QIODevice* device)
+{
     const auto* file = qobject_cast<const QFileDevice*>(device);
-    const QString source = file ? file->fileName() : QStringLiteral("XML input");
-    return readLimited(device, source, xml) && check(xml, source);
+    return file ? file->fileName() : QStringLiteral("XML input");
 }
 
 bool XmlReadPolicy::check(const QByteArray& xml, const QString& source)
@@ -95,33 +100,41 @@ bool XmlReadPolicy::check(const QByteArray& xml, const QString& source)
     QXmlStreamReader reader(xml);
     // As the DOM parse reads it: an undeclared prefix is not a breach.
     reader.setNamespaceProcessing(false);
-    int depth = 0;
+    m_depth = 0;
     while (!reader.atEnd()) {
-        switch (reader.readNext()) {
-        case QXmlStreamReader::DTD:
-            // Entity declarations are what makes expansion blow up; none of our files
-            // needs a DTD, and our own exports write only a bare one.
-            if (!reader.dtdSystemId().isEmpty() || !reader.dtdPublicId().isEmpty()
-                || reader.text().contains(QLatin1Char('[')))
-                return fail(QStringLiteral("%1: a DTD is not accepted (only a bare <!DOCTYPE name>)").arg(source));
-            break;
-        case QXmlStreamReader::StartElement:
-            if (++depth > MaxDepth)
-                return fail(QStringLiteral("%1: nesting deeper than %2 levels").arg(source).arg(MaxDepth));
-            for (const QXmlStreamAttribute& attribute : reader.attributes()) {
-                if (attribute.value().size() > MaxAttributeChars)
-                    return fail(QStringLiteral("%1: attribute \"%2\" on line %3 longer than %4 characters")
-                                    .arg(source, attribute.qualifiedName().toString())
-                                    .arg(reader.lineNumber())
-                                    .arg(MaxAttributeChars));
-            }
-            break;
-        case QXmlStreamReader::EndElement:
-            --depth;
-            break;
-        default:
-            break;
+        reader.readNext();
+        if (!checkToken(reader, source))
+            return false;
+    }
+    return true;
+}
+
+bool XmlReadPolicy::checkToken(const QXmlStreamReader& reader, const QString& source)
+{
+    switch (reader.tokenType()) {
+    case QXmlStreamReader::DTD:
+        // Entity declarations are what makes expansion blow up; none of our files
+        // needs a DTD, and our own exports write only a bare one.
+        if (!reader.dtdSystemId().isEmpty() || !reader.dtdPublicId().isEmpty()
+            || reader.text().contains(QLatin1Char('[')))
+            return fail(QStringLiteral("%1: a DTD is not accepted (only a bare <!DOCTYPE name>)").arg(source));
+        break;
+    case QXmlStreamReader::StartElement:
+        if (++m_depth > MaxDepth)
+            return fail(QStringLiteral("%1: nesting deeper than %2 levels").arg(source).arg(MaxDepth));
+        for (const QXmlStreamAttribute& attribute : reader.attributes()) {
+            if (attribute.value().size() > MaxAttributeChars)
+                return fail(QStringLiteral("%1: attribute \"%2\" on line %3 longer than %4 characters")
+                                .arg(source, attribute.qualifiedName().toString())
+                                .arg(reader.lineNumber())
+                                .arg(MaxAttributeChars));
         }
+        break;
+    case QXmlStreamReader::EndElement:
+        --m_depth;
+        break;
+    default:
+        break;
     }
     return true;
 }

@@ -5,12 +5,14 @@
 
 class QDomDocument;
 class QIODevice;
+class QXmlStreamReader;
 
 // Every XML file the programs read (device profiles, name databases, level files, platform
-// scans) may come from anyone, so it passes one streaming check before the DOM parse: no
-// DTD beyond a bare <!DOCTYPE name> (so no entity can expand), bounded nesting, attribute
-// length and file size. The check is linear in the input and stops at the first breach,
-// so a hostile file costs no more time or memory than reading it.
+// scans) may come from anyone, so it passes one streaming check, before the DOM parse or
+// token by token inside a streaming reader: no DTD beyond a bare <!DOCTYPE name> (so no
+// entity can expand), bounded nesting, attribute length and file size. The check is linear
+// in the input and stops at the first breach, so a hostile file costs no more time or
+// memory than reading it.
 class XmlReadPolicy
 {
 public:
@@ -33,10 +35,16 @@ public:
     bool read(QIODevice* device, QDomDocument& document);
     // Checks and parses bytes already read; source names them in messages.
     bool parse(const QByteArray& xml, const QString& source, QDomDocument& document);
-    // Reads and checks the file without parsing it, for readers that stream it themselves
-    // (the DOM of a large file costs far more than reading it).
-    bool readCheckedFile(const QString& path, QByteArray& xml);
-    bool readChecked(QIODevice* device, QByteArray& xml);
+    // For readers that stream the file themselves (the DOM of a large file costs far more
+    // than reading it): reads the bytes within the size limit and leaves the check to the
+    // reader, which calls checkToken() after every readNext(), so the file is parsed once.
+    bool readFileBytes(const QString& path, QByteArray& xml);
+    bool readBytes(QIODevice* device, QByteArray& xml);
+    // The name messages give the device: its file's, or "XML input".
+    static QString sourceName(const QIODevice* device);
+    // False with the message set when the token just read breaks a limit; source names the
+    // input. Keeps the nesting depth, so one policy object serves one reader.
+    bool checkToken(const QXmlStreamReader& reader, const QString& source);
 
     QString errorString() const { return m_error; }
 
@@ -49,5 +57,6 @@ private:
     bool check(const QByteArray& xml, const QString& source);
 
     qint64 m_maxFileBytes;
+    int m_depth = 0;
     QString m_error;
 };

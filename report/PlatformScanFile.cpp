@@ -7,8 +7,16 @@
 #include <QFileInfo>
 #include <QXmlStreamReader>
 
+#include <algorithm>
+
 QString PlatformScanFile::comparableId(const QString& value)
 {
+    // Our own scans write every id in the shown form already: no number to build.
+    if (value.size() == 10 && value.startsWith(QLatin1String("0x"))
+        && std::all_of(value.begin() + 2, value.end(), [](QChar c) {
+               return (c >= u'0' && c <= u'9') || (c >= u'A' && c <= u'F');
+           }))
+        return value;
     QStringView digits = QStringView(value).trimmed();
     if (digits.startsWith(QLatin1String("0x"), Qt::CaseInsensitive))
         digits = digits.mid(2);
@@ -23,7 +31,7 @@ PlatformScanFile PlatformScanFile::read(const QString& path)
     PlatformScanFile file;
     QByteArray bytes;
     XmlReadPolicy policy(XmlReadPolicy::DatabaseFileBytes);
-    if (!policy.readCheckedFile(path, bytes)) {
+    if (!policy.readFileBytes(path, bytes)) {
         file.errorString = policy.errorString();
         return file;
     }
@@ -43,6 +51,10 @@ PlatformScanFile PlatformScanFile::read(const QString& path)
     QXmlStreamReader xml(bytes);
     while (!xml.atEnd()) {
         const QXmlStreamReader::TokenType token = xml.readNext();
+        if (!policy.checkToken(xml, path)) {
+            file.errorString = policy.errorString();
+            return file;
+        }
         if (token == QXmlStreamReader::EndElement) {
             open.removeLast();
             continue;
@@ -52,15 +64,15 @@ PlatformScanFile PlatformScanFile::read(const QString& path)
         int kind = None;
         if (!open.isEmpty()) {
             const QStringView name = xml.name();
-            const QXmlStreamAttributes attributes = xml.attributes();
             if (name == u"ZantHeaderDataList") {
                 kind = HeaderDataList;
             } else if (name == u"classes") {
                 kind = Classes;
             } else if (name == u"ZTOVERSION" && !versionRead) {
                 versionRead = true;
-                file.header = XmlEscape::unescaped(attributes.value(QLatin1String("version")));
+                file.header = XmlEscape::unescaped(xml.attributes().value(QLatin1String("version")));
             } else if (name == u"ZTOId" && open.last() != None) {
+                const QXmlStreamAttributes attributes = xml.attributes();
                 listed[open.last()].append({XmlEscape::unescaped(attributes.value(QLatin1String("name"))),
                     comparableId(XmlEscape::unescaped(attributes.value(QLatin1String("value")))),
                     XmlEscape::unescaped(attributes.value(QLatin1String("family"))),

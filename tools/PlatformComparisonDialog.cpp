@@ -22,9 +22,9 @@ PlatformComparisonDialog::~PlatformComparisonDialog()
     m_placement.save(this);
 }
 
-bool PlatformComparisonDialog::loadFile(const QString& path)
+bool PlatformComparisonDialog::loadFiles(const QStringList& paths)
 {
-    return _platformView->loadScan(path);
+    return _platformView->loadScans(paths);
 }
 
 void PlatformComparisonDialog::OnCloseButtonClicked()

@@ -18,7 +18,7 @@ public:
     explicit PlatformComparisonDialog(QWidget* parent = nullptr);
     ~PlatformComparisonDialog() override;
 
-    bool loadFile(const QString& path);
+    bool loadFiles(const QStringList& paths);
 
 public slots:
     void OnCloseButtonClicked();

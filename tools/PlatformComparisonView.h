@@ -19,6 +19,8 @@ public:
     // Adds the scan file at path as a new column. False when it cannot be read; a file without
     // a class list is also reported in a "File Format Error" box (its column stays).
     bool loadScan(const QString& path);
+    // Adds the files in order, read in parallel; stops at the first that loadScan would refuse.
+    bool loadScans(const QStringList& paths);
     // The "platform-comparison" document of the scans loaded; empty before the first.
     QString exportText() const;
 

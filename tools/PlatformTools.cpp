@@ -151,7 +151,7 @@ PlatformComparisonDialog* openPlatformComparison(const QString& first, const QSt
         return nullptr;
     }
     auto* dialog = new PlatformComparisonDialog;
-    if (!dialog->loadFile(first) || !dialog->loadFile(second)) {
+    if (!dialog->loadFiles({first, second})) {
         delete dialog;
         return nullptr;
     }

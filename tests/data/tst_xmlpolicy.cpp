@@ -3,6 +3,7 @@
 // file: the limits are checked once on the policy, and each reader is checked to use it.
 #include "LevelDefinition.h"
 #include "NameDatabases.h"
+#include "PlatformScanFile.h"
 #include "TestSupport.h"
 #include "XmlEscape.h"
 #include "XmlReadPolicy.h"
@@ -30,6 +31,11 @@ int readAs(const QString& reader, const QString& path, QString& error)
         QList<IdRecord> entries;
         const bool read = file.open(QIODevice::ReadOnly) && NameDatabases::readEntries(&file, "class", entries, &error);
         return read ? int(entries.size()) : -1;
+    }
+    if (reader == "platform scan") {
+        const PlatformScanFile scan = PlatformScanFile::read(path);
+        error = scan.errorString;
+        return scan.status == PlatformScanFile::Read ? int(scan.entries.size()) : -1;
     }
     if (reader == "level file") {
         LevelDefinition level;
@@ -114,6 +120,9 @@ private slots:
                                        << QByteArray("</classes>") << database;
         QTest::newRow("level file") << "level file" << QByteArray(R"(<level><Id value="0x01011001" name="Heap"/>)")
                                     << QByteArray("</level>") << database;
+        QTest::newRow("platform scan") << "platform scan"
+                                       << QByteArray(R"(<ZTOINFO><ZantHeaderDataList><ZTOId value="0x01011001"/>)")
+                                       << QByteArray("</ZantHeaderDataList></ZTOINFO>") << database;
 #ifdef DELVIX_WITH_SIM
         QTest::newRow("device profile") << "device profile" << QByteArray(R"(<device id="t" name="T"><volume id="1" mount="/" folder="flash"/>)")
                                         << QByteArray("</device>") << XmlReadPolicy::ProfileFileBytes;

@@ -208,6 +208,7 @@ private slots:
         QTest::newRow("no class list") << a << scanFile("", "other", {"0x7E000001=Alpha"}) << QStringList()
                                        << "File Format Error|SECOND is not the right format.";
         QTest::newRow("not XML") << a << QByteArray("<ZTOINFO><ZTOVERSION") << QStringList() << "";
+        QTest::newRow("first not XML") << QByteArray("<ZTOINFO><ZTOVERSION") << a << QStringList() << "";
         QTest::newRow("same file") << a << QByteArray() << QStringList()
                                    << "User Error|The files are the same";
     }
@@ -261,9 +262,9 @@ private slots:
         auto* dialog = new PlatformComparisonDialog;
         PlatformComparisonView* view = dialog->_platformView;
         view->_differencesOnly->setChecked(true);
-        QVERIFY(dialog->loadFile(folder.filePath("a.xml")));
+        QVERIFY(dialog->loadFiles({folder.filePath("a.xml")}));
         QCOMPARE(tableLines(view->_comparisonTable).size(), 1);
-        QVERIFY(dialog->loadFile(folder.filePath("b.xml")));
+        QVERIFY(dialog->loadFiles({folder.filePath("b.xml")}));
         QCOMPARE(tableLines(view->_comparisonTable).mid(0, 2),
             (QStringList {"Alpha|0x7E000001|F|S|x|", "Beta|0x7E000002|F|S||x"}));
         view->_differencesOnly->setChecked(false);
