@@ -161,6 +161,7 @@ void GatewayComponentWidget::searchTable(const QString& text, QTableView* table)
     }
     m_tableHits = compactCellSelection(table->model(), cells);
     table->selectionModel()->select(m_tableHits, QItemSelectionModel::Select);
+    table->scrollTo(table->model()->index(cells.first().first, cells.first().second));
     table->setUpdatesEnabled(true);
 }
 
@@ -208,6 +209,8 @@ void GatewayComponentWidget::searchTree(const QString& text, QTreeWidget* tree)
     tree->selectionModel()->select(compactRowSelection(tree, hits), QItemSelectionModel::Select);
     for (int column = 0; column < tree->columnCount(); ++column)
         tree->resizeColumnToContents(column);
+    // Hits are collected in the tree's order: the first is the topmost.
+    tree->scrollToItem(hits.first());
     tree->setUpdatesEnabled(true);
 }
 

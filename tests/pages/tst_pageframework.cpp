@@ -401,6 +401,27 @@ private slots:
         QVERIFY(page.searchText().isEmpty());
     }
 
+    // A hit far down a long tree is brought into view, the topmost hit first.
+    void treeSearchScrollsToFirstHit()
+    {
+        SearchPage page;
+        for (int i = 0; i < 300; ++i)
+            new QTreeWidgetItem(&page.tree, {QString("Node %1").arg(i)});
+        new QTreeWidgetItem(page.tree.topLevelItem(250), {"", "Found here"});
+        new QTreeWidgetItem(page.tree.topLevelItem(280), {"", "Found later"});
+        page.tree.resize(300, 200);
+        page.tree.show();
+        QVERIFY(QTest::qWaitForWindowExposed(&page.tree));
+        const auto inView = [&page](const QTreeWidgetItem* item) {
+            return page.tree.viewport()->rect().contains(page.tree.visualItemRect(item));
+        };
+        const QTreeWidgetItem* first = page.tree.topLevelItem(250)->child(0);
+        QVERIFY(!inView(first));
+        QVERIFY(page.searchInTree("found"));
+        QVERIFY(inView(first));
+        QVERIFY(!inView(page.tree.topLevelItem(280)->child(0)));
+    }
+
     // order: -1 the left item sorts first, 1 the right one, 0 neither.
     void order_data()
     {
