@@ -85,7 +85,7 @@ qint32 DeviceConnection::download(Operation operation, const QByteArray& request
             if ((result = readExactly(data.data(), size, deadline)) != 0)
                 return result;
             if ((result = sink(data.constData(), size)) != 0)
-                return fail(result, QStringLiteral("The download was stopped on this side (%1)").arg(result));
+                return fail(result, QStringLiteral("The download was stopped on this side"));
             working.setRemainingTime(patience * Protocol::StillWorkingLimit);
             continue;
         }
@@ -146,7 +146,7 @@ qint32 DeviceConnection::stopUpload(const Frame& header, qint32 code, QDeadlineT
     QByteArray body;
     if (writeAll(empty, Protocol::HeaderSize, deadline) == 0)
         receive(Operation(header.operation), &body, deadline);
-    m_error = QStringLiteral("The upload was stopped on this side (%1)").arg(code);
+    m_error = QStringLiteral("The upload was stopped on this side");
     return code;
 }
 
@@ -204,7 +204,7 @@ qint32 DeviceConnection::finishHandshake(QDeadlineTimer deadline)
         return fail(result, message.isEmpty() ? QStringLiteral("The device speaks another protocol version") : message);
     }
     if (result != 0)
-        return fail(result, QStringLiteral("The device refused the handshake (%1)").arg(result));
+        return fail(result, QStringLiteral("The device refused the handshake"));
     in >> m_displayName >> m_deviceId;
     if (!in.ok())
         return fail(PortlexError::ProtocolError, QStringLiteral("Unreadable handshake answer"));

@@ -169,7 +169,7 @@ bool _ZantDevice::attach(const QString& user, const QString& password, int* code
     QString why;
     *code = query(Operation::GetCache, QByteArray(), &why, *filled);
     if (*code != 0) {
-        *reason = QStringLiteral("The device did not give its description (%1)").arg(*code);
+        *reason = QStringLiteral("The device did not give its description");
         if (!why.isEmpty())
             *reason += QStringLiteral(": ") + why;
         return false;
@@ -418,7 +418,7 @@ int _ZantDevice::InstallPackage(const QString& localPath, unsigned short volumeI
     }
     if (status.isEmpty())
         status = result == 0 ? QStringLiteral("%1 installed").arg(name)
-                             : QStringLiteral("The package %1 was not installed (error %2)").arg(name).arg(result);
+                             : QStringLiteral("The package %1 was not installed").arg(name);
     if (reason)
         *reason = status;
     return result;

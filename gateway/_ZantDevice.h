@@ -33,8 +33,9 @@
 // are 0 for success, else a code from PortlexErrors.h or one the device chose; on
 // failure the output arguments are unchanged. Each call's reason (may be null) gets that
 // call's own explanation: the device's word when it said why it refused, or what went
-// wrong on the way; empty when there is none. Nothing about one call is kept on the
-// object, so threads never see each other's failures.
+// wrong on the way, in words without the code (callers show the code beside it); empty
+// when there is none. Nothing about one call is kept on the object, so threads never see
+// each other's failures.
 class QFile;
 
 class _ZantDevice
