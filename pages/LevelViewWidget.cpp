@@ -12,6 +12,7 @@
 #include <QFutureWatcher>
 #include <QHeaderView>
 #include <QThreadPool>
+#include <QTimer>
 #include <QtConcurrent/QtConcurrentRun>
 
 #include <algorithm>
@@ -141,8 +142,19 @@ void LevelViewWidget::onCurrentLevelChanged(int index)
     auto* answer = new QFutureWatcher<std::shared_ptr<LevelRead>>(this);
     connect(answer, &QFutureWatcherBase::finished, this, [this, answer, request] {
         answer->deleteLater();
-        if (request == m_request)
-            showLevel(*answer->result());
+        if (request != m_request)
+            return;
+        const std::shared_ptr<LevelRead> level = answer->result();
+        // Taking a large level out and putting the next one in are each about a frame's
+        // work: they get a tick each.
+        if (!level->readable || !takeShownLevel()) {
+            showLevel(*level);
+            return;
+        }
+        QTimer::singleShot(0, this, [this, level, request] {
+            if (request == m_request)
+                showLevel(*level);
+        });
     });
     // The worker reads a copy of the classes: the device's record may change or go meanwhile.
     answer->setFuture(QtConcurrent::run(&LevelViewWidget::read, path, m_record->classes));
@@ -167,11 +179,7 @@ void LevelViewWidget::showLevel(LevelRead& level)
         return;
     }
     _level1Tree->setUpdatesEnabled(false);
-    // The level shown before goes on a pool thread: deleting tens of thousands of items
-    // would hold up the GUI thread as long as making them.
-    const QList<QTreeWidgetItem*> shown = _level1Tree->invisibleRootItem()->takeChildren();
-    if (!shown.isEmpty())
-        QThreadPool::globalInstance()->start([shown] { qDeleteAll(shown); });
+    takeShownLevel();
     // The families come sorted as the tree sorts them: the indicator is set without sorting.
     _level1Tree->addTopLevelItems(std::exchange(level.families, {}));
     _level1Tree->header()->setSortIndicator(FamilyColumn, Qt::AscendingOrder);
@@ -183,6 +191,19 @@ void LevelViewWidget::showLevel(LevelRead& level)
     m_report.clear();
     setStatus(readyStatus());
     setState(Complete);
+}
+
+bool LevelViewWidget::takeShownLevel()
+{
+    if (_level1Tree->topLevelItemCount() == 0)
+        return false;
+    // Collapsed first: taking expanded rows out costs the view twice as much.
+    _level1Tree->collapseAll();
+    // The items go on a pool thread: deleting tens of thousands of them would hold up the
+    // GUI thread as long as making them.
+    const QList<QTreeWidgetItem*> shown = _level1Tree->invisibleRootItem()->takeChildren();
+    QThreadPool::globalInstance()->start([shown] { qDeleteAll(shown); });
+    return true;
 }
 
 QString LevelViewWidget::xmlReport()

@@ -43,6 +43,9 @@ private:
     void offerLevelFiles(const DeviceCache* record, QStringList files);
     static std::shared_ptr<LevelRead> read(const QString& path, const IdRecordMap& classes);
     void showLevel(LevelRead& level);
+    // Takes the level shown out of the tree, for deletion off the GUI thread; false when
+    // there was none.
+    bool takeShownLevel();
 
     const DeviceCache* m_record = nullptr;
     QString m_report;

@@ -63,7 +63,7 @@ QSharedPointer<_ZantDevice> connectDevice(const QString& id)
 QSharedPointer<_ZantDevice> serveGeneratedDevice(QProcess& server, const QTemporaryDir& work, int modules, int classes,
                                                  int settings, const QString& id, int files)
 {
-    const QString image = work.filePath(QStringLiteral("image-") + id);
+    const QString image = imagePath(work, id);
     if (!work.isValid() || !generateImage(image, modules, classes, settings, files)) {
         std::fprintf(stderr, "cannot generate the image with %s\n", qPrintable(simulatorPath()));
         return {};
@@ -73,6 +73,11 @@ QSharedPointer<_ZantDevice> serveGeneratedDevice(QProcess& server, const QTempor
     if (!device)
         std::fprintf(stderr, "the simulator did not answer: %s\n", qPrintable(QString::fromLocal8Bit(server.readAll())));
     return device;
+}
+
+QString imagePath(const QTemporaryDir& work, const QString& id)
+{
+    return work.filePath(QStringLiteral("image-") + id);
 }
 
 long peakMemoryMb()

@@ -24,10 +24,11 @@ void startSimulator(QProcess& server, const QString& image, const QString& socke
 bool generateImage(const QString& image, int modules, int classes, int settings = 0, int files = 0);
 // Waits (up to two minutes, while a large image loads) for the simulator and connects it.
 QSharedPointer<_ZantDevice> connectDevice(const QString& id = DeviceId);
-// Generates an image of that size in work, serves and connects it (the image loaded); null
-// after saying why on stderr.
+// Generates an image of that size in work (at imagePath), serves and connects it (the image
+// loaded); null after saying why on stderr.
 QSharedPointer<_ZantDevice> serveGeneratedDevice(QProcess& server, const QTemporaryDir& work, int modules, int classes,
                                                  int settings = 0, const QString& id = DeviceId, int files = 0);
+QString imagePath(const QTemporaryDir& work, const QString& id = DeviceId);
 long peakMemoryMb();
 
 } // namespace PageBenchDevice

@@ -28,6 +28,7 @@
 #include <algorithm>
 #include <atomic>
 #include <csignal>
+#include <cstdio>
 #include <functional>
 
 using namespace PageBenchDevice;
@@ -114,7 +115,7 @@ int main(int argc, char** argv)
     std::atomic<qint64> answeredMs{-1};
     QElapsedTimer sinceReturn;
     sinceReturn.start();
-    startSimulator(server, work.filePath(QStringLiteral("image")), work.filePath(QStringLiteral("sockets")));
+    startSimulator(server, imagePath(work), work.filePath(QStringLiteral("sockets")));
     QThread* probe = QThread::create([&] {
         while (!sinceReturn.hasExpired(120000)) {
             QList<QPair<QString, QString>> devices;
@@ -135,7 +136,11 @@ int main(int argc, char** argv)
                             "%3 pages shown before Ready after %4 ms (%5 ms after the simulator answered; target 2000)\n")
                  .arg(answeredMs.load()).arg(connected).arg(shown.size()).arg(ready).arg(ready - answeredMs.load());
 
-    // Each dialog that asks the device, opened while it is paused.
+    // Each dialog that asks the device, opened while it is paused (a pid of 0 would stop us).
+    if (server.state() != QProcess::Running) {
+        std::fprintf(stderr, "the simulator did not come back: %s\n", qPrintable(QString::fromLocal8Bit(server.readAll())));
+        return 1;
+    }
     ::kill(pid_t(server.processId()), SIGSTOP);
     {
         auto* info = new ModuleInfoDialog;
