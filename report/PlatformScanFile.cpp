@@ -48,6 +48,9 @@ PlatformScanFile PlatformScanFile::read(const QString& path)
     bool found[2] = {false, false};
     bool versionRead = false;
     QVector<int> open; // the container kind of each open element
+    // Neighbouring entries mostly share their family texts (and unknown classes their name):
+    // one string each, shared, instead of three new ones per entry.
+    QString lastName, lastFamily, lastSubFamily;
     QXmlStreamReader xml(bytes);
     while (!xml.atEnd()) {
         const QXmlStreamReader::TokenType token = xml.readNext();
@@ -73,10 +76,15 @@ PlatformScanFile PlatformScanFile::read(const QString& path)
                 file.header = XmlEscape::unescaped(xml.attributes().value(QLatin1String("version")));
             } else if (name == u"ZTOId" && open.last() != None) {
                 const QXmlStreamAttributes attributes = xml.attributes();
-                listed[open.last()].append({XmlEscape::unescaped(attributes.value(QLatin1String("name"))),
+                const auto text = [&attributes](const char* attribute, QString& last) {
+                    const QStringView value = attributes.value(QLatin1String(attribute));
+                    if (value != last)
+                        last = XmlEscape::unescaped(value);
+                    return last;
+                };
+                listed[open.last()].append({text("name", lastName),
                     comparableId(XmlEscape::unescaped(attributes.value(QLatin1String("value")))),
-                    XmlEscape::unescaped(attributes.value(QLatin1String("family"))),
-                    XmlEscape::unescaped(attributes.value(QLatin1String("subfamily")))});
+                    text("family", lastFamily), text("subfamily", lastSubFamily)});
             }
         }
         if (kind != None)

@@ -14,6 +14,12 @@ QString scanAttribute(int scan)
 
 } // namespace
 
+void ScanComparison::reserve(qsizetype classes)
+{
+    m_classes.reserve(classes);
+    m_index.reserve(classes);
+}
+
 int ScanComparison::addScan(const QString& header)
 {
     m_scans.append(header);
@@ -28,7 +34,7 @@ int ScanComparison::add(int scan, const QString& name, const QString& id, const 
     const int index = isNew ? int(m_classes.size()) : *found;
     if (isNew) {
         m_index.insert(id, index);
-        m_classes.append({name, id, family, subFamily, QBitArray()});
+        m_classes.append({name, id, family, subFamily, QBitArray(int(m_scans.size()))});
     }
     QBitArray& presence = m_classes[index].presence;
     if (presence.size() <= scan)

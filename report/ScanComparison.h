@@ -23,6 +23,8 @@ public:
         QBitArray presence; // by scan; scans added after the class was last marked are absent
     };
 
+    // Room for that many classes in all, so a large scan fills without regrowing.
+    void reserve(qsizetype classes);
     // A new scan, named by header; returns its index.
     int addScan(const QString& header);
     // Marks the class with that id present in scan, adding it (with these names) when new.

@@ -29,6 +29,8 @@ void PlatformComparisonModel::addEntries(int scan, const QVector<PlatformScanFil
     // Presence changes which rows the filter shows, so the rows are laid out afresh once.
     beginResetModel();
     const int known = int(m_comparison.classes().size());
+    m_comparison.reserve(known + entries.size());
+    m_sorted.reserve(known + entries.size());
     for (const PlatformScanFile::Entry& entry : entries)
         m_comparison.add(scan, entry.name, entry.value, entry.family, entry.subFamily);
     for (int index = known; index < m_comparison.classes().size(); ++index)
