@@ -86,7 +86,7 @@ void ModuleListView::onTimeElapse()
     const FeedStep step = m_pending->drain([this, &rows](const ModuleInfo& module) {
         m_modules.append(module);
         rows.append(ModuleReport::cells(module));
-    });
+    }, SliceMs);
     m_model->appendRows(rows);
     if (!m_pacer.pace(step, 0))
         finish();

@@ -26,6 +26,9 @@ public:
     static constexpr int FirstTickMs = 500;
     static constexpr int IdleStartMs = 1;
     static constexpr int IdleCapMs = 500;
+    // A module row is six long texts: a shorter slice than the other pages' leaves the rest
+    // of the frame to lay them out.
+    static constexpr int SliceMs = 5;
 
     explicit ModuleListView(QWidget* parent = nullptr);
 
