@@ -146,12 +146,13 @@ void LevelViewWidget::onCurrentLevelChanged(int index)
             return;
         const std::shared_ptr<LevelRead> level = answer->result();
         // Taking a large level out and putting the next one in are each about a frame's
-        // work: they get a tick each.
+        // work: they get a tick each (a timer, since a posted call would run in this turn of
+        // the event loop, before the repaint).
         if (!level->readable || !takeShownLevel()) {
             showLevel(*level);
             return;
         }
-        QTimer::singleShot(0, this, [this, level, request] {
+        QTimer::singleShot(1, this, [this, level, request] {
             if (request == m_request)
                 showLevel(*level);
         });

@@ -14,6 +14,7 @@
 #include "ClassListView.h"
 #include "DeviceCache.h"
 #include "DeviceWindow.h"
+#include "GuiHeartbeat.h"
 #include "IdFormat.h"
 #include "ModuleListView.h"
 #include "PageBenchDevice.h"
@@ -33,8 +34,6 @@
 #include <QTextStream>
 #include <QTimer>
 
-#include <time.h>
-
 #include <algorithm>
 #include <cstdio>
 #include <functional>
@@ -47,21 +46,6 @@ QTextStream& out()
 {
     static QTextStream stream(stdout);
     return stream;
-}
-
-// CPU time of the calling thread: on a busy machine it tells our own work from the time the
-// scheduler gave to other processes.
-qint64 threadCpuMs()
-{
-    timespec now {};
-    clock_gettime(CLOCK_THREAD_CPUTIME_ID, &now);
-    return qint64(now.tv_sec) * 1000 + now.tv_nsec / 1000000;
-}
-
-qint64 percentile99(QVector<qint64> values)
-{
-    std::sort(values.begin(), values.end());
-    return values.isEmpty() ? 0 : values.at(std::min<qsizetype>(values.size() - 1, values.size() * 99 / 100));
 }
 
 template <typename T>
@@ -81,56 +65,20 @@ struct Gaps
     int beats = 0;
 };
 
-// Gaps between the beats of a 5 ms heartbeat on the GUI thread, each with the CPU time the
-// GUI thread spent within it.
-class Heartbeat
+void stopInto(GuiHeartbeat& heartbeat, Gaps& gaps)
 {
-public:
-    Heartbeat()
-    {
-        m_timer.setTimerType(Qt::PreciseTimer);
-        m_timer.setInterval(5);
-        QObject::connect(&m_timer, &QTimer::timeout, [this] { beat(); });
-    }
-    void start()
-    {
-        m_gaps.clear();
-        m_cpu.clear();
-        m_cpuAtBeat = threadCpuMs();
-        m_sinceBeat.start();
-        m_timer.start();
-    }
-    void stopInto(Gaps& gaps)
-    {
-        beat();
-        m_timer.stop();
-        gaps.longest = *std::max_element(m_gaps.cbegin(), m_gaps.cend());
-        gaps.p99 = percentile99(m_gaps);
-        gaps.longestCpu = *std::max_element(m_cpu.cbegin(), m_cpu.cend());
-        gaps.p99Cpu = percentile99(m_cpu);
-        gaps.beats = int(m_gaps.size());
-    }
-
-private:
-    void beat()
-    {
-        const qint64 cpu = threadCpuMs();
-        m_gaps.append(m_sinceBeat.restart());
-        m_cpu.append(cpu - m_cpuAtBeat);
-        m_cpuAtBeat = cpu;
-    }
-
-    QTimer m_timer;
-    QElapsedTimer m_sinceBeat;
-    qint64 m_cpuAtBeat = 0;
-    QVector<qint64> m_gaps;
-    QVector<qint64> m_cpu;
-};
+    heartbeat.stop();
+    gaps.longest = heartbeat.longest();
+    gaps.p99 = heartbeat.p99();
+    gaps.longestCpu = heartbeat.mostCpu();
+    gaps.p99Cpu = heartbeat.p99Cpu();
+    gaps.beats = heartbeat.beats();
+}
 
 // Runs the event loop until page is complete (or failed), under the heartbeat.
 Gaps fill(GatewayComponentWidget* page, const std::function<void()>& start)
 {
-    Heartbeat heartbeat;
+    GuiHeartbeat heartbeat;
     QEventLoop loop;
     QObject::connect(page, &GatewayComponentWidget::stateChanged, &loop, [&](GatewayComponentWidget::ComponentState state) {
         if (state == GatewayComponentWidget::Complete || state == GatewayComponentWidget::Failed)
@@ -147,14 +95,14 @@ Gaps fill(GatewayComponentWidget* page, const std::function<void()>& start)
     // One more turn, so that the paint after the last rows counts too.
     QTimer::singleShot(0, &loop, &QEventLoop::quit);
     loop.exec();
-    heartbeat.stopInto(gaps);
+    stopInto(heartbeat, gaps);
     return gaps;
 }
 
 // One piece of GUI work (a sort, a search) and the repaint after it, under the heartbeat.
 Gaps during(const std::function<void()>& work)
 {
-    Heartbeat heartbeat;
+    GuiHeartbeat heartbeat;
     QEventLoop loop;
     QElapsedTimer timer;
     Gaps gaps;
@@ -166,7 +114,7 @@ Gaps during(const std::function<void()>& work)
     });
     QTimer::singleShot(150, &loop, &QEventLoop::quit);
     loop.exec();
-    heartbeat.stopInto(gaps);
+    stopInto(heartbeat, gaps);
     return gaps;
 }
 

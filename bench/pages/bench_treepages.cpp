@@ -11,6 +11,7 @@
 
 #include "DeviceWindow.h"
 #include "FamilyTreeView.h"
+#include "GuiHeartbeat.h"
 #include "ISettingsTreeView.h"
 #include "IdFormat.h"
 #include "LevelViewWidget.h"
@@ -29,8 +30,6 @@
 #include <QTreeWidgetItemIterator>
 #include <QXmlStreamWriter>
 
-#include <time.h>
-
 #include <algorithm>
 #include <cstdio>
 #include <functional>
@@ -39,15 +38,6 @@
 using namespace PageBenchDevice;
 
 namespace {
-
-// CPU time of the calling thread: on a busy machine it tells our own work from the time
-// the scheduler gave to other processes.
-qint64 threadCpuMs()
-{
-    timespec now {};
-    clock_gettime(CLOCK_THREAD_CPUTIME_ID, &now);
-    return qint64(now.tv_sec) * 1000 + now.tv_nsec / 1000000;
-}
 
 QTextStream& out()
 {
@@ -62,63 +52,6 @@ T median(QVector<T> values)
     return values.isEmpty() ? T() : values.at(values.size() / 2);
 }
 
-// A 5 ms timer on the GUI thread: every interval between two of its beats, so that a block
-// of the event loop shows as a long one.
-class Heartbeat
-{
-public:
-    Heartbeat()
-    {
-        m_timer.setTimerType(Qt::PreciseTimer);
-        m_timer.setInterval(5);
-        QObject::connect(&m_timer, &QTimer::timeout, [this] { beat(); });
-    }
-
-    void start()
-    {
-        m_gaps.clear();
-        m_longestCpu = 0;
-        m_cpuAtBeat = threadCpuMs();
-        m_sinceBeat.start();
-        m_timer.start();
-    }
-    // One more beat, so that a block at the very end counts too.
-    void stop()
-    {
-        QEventLoop loop;
-        QTimer::singleShot(0, &loop, &QEventLoop::quit);
-        loop.exec();
-        beat();
-        m_timer.stop();
-    }
-    qint64 longest() const { return m_gaps.isEmpty() ? 0 : *std::max_element(m_gaps.cbegin(), m_gaps.cend()); }
-    // The GUI thread's own CPU time within the longest gap.
-    qint64 longestCpu() const { return m_longestCpu; }
-    qint64 p99() const
-    {
-        QVector<qint64> sorted = m_gaps;
-        std::sort(sorted.begin(), sorted.end());
-        return sorted.isEmpty() ? 0 : sorted.at(std::max(0, int(sorted.size() * 99 + 99) / 100 - 1));
-    }
-
-private:
-    void beat()
-    {
-        const qint64 gap = m_sinceBeat.restart();
-        const qint64 cpu = threadCpuMs();
-        if (gap > longest())
-            m_longestCpu = cpu - m_cpuAtBeat;
-        m_cpuAtBeat = cpu;
-        m_gaps.append(gap);
-    }
-
-    QTimer m_timer;
-    qint64 m_cpuAtBeat = 0;
-    qint64 m_longestCpu = 0;
-    QElapsedTimer m_sinceBeat;
-    QVector<qint64> m_gaps;
-};
-
 struct Gaps
 {
     qint64 readyMs = 0;
@@ -130,7 +63,7 @@ struct Gaps
 // Runs start, then the event loop until page is complete or failed, with the heartbeat on.
 Gaps fill(GatewayComponentWidget* page, const std::function<void()>& start)
 {
-    Heartbeat heartbeat;
+    GuiHeartbeat heartbeat;
     QEventLoop loop;
     QObject::connect(page, &GatewayComponentWidget::stateChanged, &loop, [&](GatewayComponentWidget::ComponentState state) {
         if (state == GatewayComponentWidget::Complete || state == GatewayComponentWidget::Failed)
@@ -147,7 +80,7 @@ Gaps fill(GatewayComponentWidget* page, const std::function<void()>& start)
     heartbeat.stop();
     gaps.longest = heartbeat.longest();
     gaps.p99 = heartbeat.p99();
-    gaps.longestCpu = heartbeat.longestCpu();
+    gaps.longestCpu = heartbeat.cpuOfLongest();
     return gaps;
 }
 
@@ -155,7 +88,7 @@ Gaps fill(GatewayComponentWidget* page, const std::function<void()>& start)
 // more, its repaints included.
 Gaps during(const std::function<void()>& action)
 {
-    Heartbeat heartbeat;
+    GuiHeartbeat heartbeat;
     QEventLoop loop;
     heartbeat.start();
     QElapsedTimer took;
@@ -166,7 +99,7 @@ Gaps during(const std::function<void()>& action)
     });
     loop.exec();
     heartbeat.stop();
-    return {took.elapsed() - 300, heartbeat.longest(), heartbeat.p99(), heartbeat.longestCpu()};
+    return {took.elapsed() - 300, heartbeat.longest(), heartbeat.p99(), heartbeat.cpuOfLongest()};
 }
 
 void printGaps(const QString& what, const QVector<Gaps>& runs)
